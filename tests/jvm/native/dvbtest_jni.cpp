@@ -1,0 +1,330 @@
+// Test-only JNI library: lets the JVM tests drive the spy service, read the lines that
+// libDVBjni writes to the Android log, and watch the JNI global references it makes.
+// It is loaded before libDVBjni so that the log capture sees the library's load.
+#include <DVB.h>
+#include <android/log.h>
+#include <nativehelper/JNIHelp.h>
+#include <nativehelper/jni_macros.h>
+#include <nativehelper/scoped_local_ref.h>
+#include <nativehelper/scoped_primitive_array.h>
+#include <nativehelper/scoped_utf_chars.h>
+#include <spy/Spy.h>
+
+#include <dlfcn.h>
+
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <mutex>
+#include <string>
+#include <vector>
+
+namespace {
+
+std::mutex gLock;
+std::vector<std::string> gLogs;
+std::vector<std::string> gRefEvents;
+bool gEchoLogs = false;
+
+void captureLog(const __android_logger_data* data, const char* message) {
+    char head[64];
+    snprintf(head, sizeof head, "%d ", data->priority);
+    std::string line = std::string(head) + (data->tag != nullptr ? data->tag : "") + " " + message;
+    std::lock_guard<std::mutex> lock(gLock);
+    if (gEchoLogs) fprintf(stderr, "log: %s\n", line.c_str());
+    gLogs.push_back(std::move(line));
+}
+
+// ---- global reference tracking ----------------------------------------------------------
+// A copy of a thread's JNI function table with NewGlobalRef and DeleteGlobalRef wrapped. It
+// is installed on the test thread and on every service thread as it attaches.
+JNINativeInterface gHooked;
+const JNINativeInterface* gOriginal = nullptr;
+jclass gClassClass = nullptr;
+
+const char* kindOf(JNIEnv* env, jobject ref) {
+    return gOriginal->IsInstanceOf(env, ref, gClassClass) ? "class" : "object";
+}
+
+jobject JNICALL hookedNewGlobalRef(JNIEnv* env, jobject obj) {
+    jobject ref = gOriginal->NewGlobalRef(env, obj);
+    std::string event = std::string("new ") + kindOf(env, obj);
+    std::lock_guard<std::mutex> lock(gLock);
+    gRefEvents.push_back(event);
+    return ref;
+}
+
+void JNICALL hookedDeleteGlobalRef(JNIEnv* env, jobject ref) {
+    if (ref != nullptr) {
+        std::string event = std::string("delete ") + kindOf(env, ref);
+        std::lock_guard<std::mutex> lock(gLock);
+        gRefEvents.push_back(event);
+    }
+    gOriginal->DeleteGlobalRef(env, ref);
+}
+
+void hookThread(JNIEnv* env) {
+    if (gOriginal == nullptr) return;
+    env->functions = &gHooked;
+}
+
+// ---- natives of android.DVB.Spy ---------------------------------------------------------
+
+void Spy_reset(JNIEnv*, jclass) {
+    dvbspy::reset();
+    std::lock_guard<std::mutex> lock(gLock);
+    gLogs.clear();
+    gRefEvents.clear();
+}
+
+jint Spy_callCount(JNIEnv*, jclass) {
+    return static_cast<jint>(dvbspy::callCount());
+}
+
+bool callAt(JNIEnv* env, jint i, dvbspy::Call* out) {
+    auto calls = dvbspy::calls();
+    if (i < 0 || static_cast<size_t>(i) >= calls.size()) {
+        jniThrowExceptionFmt(env, "java/lang/IndexOutOfBoundsException", "call %d of %zu", i,
+                             calls.size());
+        return false;
+    }
+    *out = calls[i];
+    return true;
+}
+
+jstring Spy_op(JNIEnv* env, jclass, jint i) {
+    dvbspy::Call c;
+    return callAt(env, i, &c) ? env->NewStringUTF(c.op.c_str()) : nullptr;
+}
+
+jlongArray Spy_args(JNIEnv* env, jclass, jint i) {
+    dvbspy::Call c;
+    if (!callAt(env, i, &c)) return nullptr;
+    jlongArray a = env->NewLongArray(static_cast<jsize>(c.args.size()));
+    if (a != nullptr && !c.args.empty()) {
+        std::vector<jlong> v(c.args.begin(), c.args.end());
+        env->SetLongArrayRegion(a, 0, static_cast<jsize>(v.size()), v.data());
+    }
+    return a;
+}
+
+jint Spy_recordCount(JNIEnv* env, jclass, jint i) {
+    dvbspy::Call c;
+    return callAt(env, i, &c) ? static_cast<jint>(c.records.size()) : -1;
+}
+
+jbyteArray Spy_record(JNIEnv* env, jclass, jint i, jint r) {
+    dvbspy::Call c;
+    if (!callAt(env, i, &c)) return nullptr;
+    if (r < 0 || static_cast<size_t>(r) >= c.records.size()) {
+        jniThrowExceptionFmt(env, "java/lang/IndexOutOfBoundsException", "record %d of %zu", r,
+                             c.records.size());
+        return nullptr;
+    }
+    const auto& bytes = c.records[r];
+    jbyteArray a = env->NewByteArray(static_cast<jsize>(bytes.size()));
+    if (a != nullptr && !bytes.empty()) {
+        env->SetByteArrayRegion(a, 0, static_cast<jsize>(bytes.size()),
+                                reinterpret_cast<const jbyte*>(bytes.data()));
+    }
+    return a;
+}
+
+jlong Spy_owner(JNIEnv* env, jclass, jint i) {
+    dvbspy::Call c;
+    return callAt(env, i, &c) ? static_cast<jlong>(reinterpret_cast<uintptr_t>(c.owner)) : 0;
+}
+
+void Spy_setResult(JNIEnv* env, jclass, jstring op, jint result) {
+    ScopedUtfChars name(env, op);
+    if (name.c_str() != nullptr) dvbspy::setResult(name.c_str(), result);
+}
+
+void Spy_setOut(JNIEnv* env, jclass, jstring op, jint arg, jint offset, jbyteArray bytes) {
+    ScopedUtfChars name(env, op);
+    ScopedByteArrayRO b(env, bytes);
+    if (name.c_str() == nullptr || b.get() == nullptr) return;
+    const auto* p = reinterpret_cast<const uint8_t*>(b.get());
+    dvbspy::setOut(name.c_str(), arg, static_cast<size_t>(offset),
+                   std::vector<uint8_t>(p, p + b.size()));
+}
+
+void Spy_setList(JNIEnv* env, jclass, jstring op, jobjectArray nodes) {
+    ScopedUtfChars name(env, op);
+    if (name.c_str() == nullptr) return;
+    std::vector<std::vector<uint8_t>> list;
+    jsize n = env->GetArrayLength(nodes);
+    for (jsize i = 0; i < n; ++i) {
+        ScopedLocalRef<jbyteArray> node(
+                env, static_cast<jbyteArray>(env->GetObjectArrayElement(nodes, i)));
+        ScopedByteArrayRO b(env, node.get());
+        if (b.get() == nullptr) return;
+        const auto* p = reinterpret_cast<const uint8_t*>(b.get());
+        list.emplace_back(p, p + b.size());
+    }
+    dvbspy::setList(name.c_str(), list);
+}
+
+void Spy_omit(JNIEnv* env, jclass, jobjectArray modules) {
+    std::vector<std::string> names;
+    jsize n = env->GetArrayLength(modules);
+    for (jsize i = 0; i < n; ++i) {
+        ScopedLocalRef<jstring> s(env,
+                                  static_cast<jstring>(env->GetObjectArrayElement(modules, i)));
+        ScopedUtfChars name(env, s.get());
+        if (name.c_str() == nullptr) return;
+        names.emplace_back(name.c_str());
+    }
+    dvbspy::omitModules(names);
+}
+
+jlongArray Spy_liveDvbs(JNIEnv* env, jclass) {
+    auto live = dvbsvc::liveDvbs();
+    std::vector<jlong> v;
+    for (const auto& dvb : live)
+        v.push_back(static_cast<jlong>(reinterpret_cast<uintptr_t>(dvb.get())));
+    jlongArray a = env->NewLongArray(static_cast<jsize>(v.size()));
+    if (a != nullptr && !v.empty())
+        env->SetLongArrayRegion(a, 0, static_cast<jsize>(v.size()), v.data());
+    return a;
+}
+
+jint Spy_liveDvbCount(JNIEnv*, jclass) {
+    return static_cast<jint>(dvbsvc::liveDvbCount());
+}
+
+// Strong references on the DVB object at `address`, not counting the one taken to ask; -1
+// when no such object lives.
+jint Spy_strongCount(JNIEnv*, jclass, jlong address) {
+    for (const auto& dvb : dvbsvc::liveDvbs()) {
+        if (static_cast<jlong>(reinterpret_cast<uintptr_t>(dvb.get())) == address) {
+            return dvb->getStrongCount() - 1;
+        }
+    }
+    return -1;
+}
+
+jboolean Spy_hasListener(JNIEnv*, jclass, jlong address) {
+    for (const auto& dvb : dvbsvc::liveDvbs()) {
+        if (static_cast<jlong>(reinterpret_cast<uintptr_t>(dvb.get())) == address) {
+            return dvb->mListener != nullptr;
+        }
+    }
+    return false;
+}
+
+jint Spy_liveListenerCount(JNIEnv*, jclass) {
+    return static_cast<jint>(dvbsvc::liveListenerCount());
+}
+
+void Spy_raise(JNIEnv*, jclass, jint msg, jint ext1, jint ext2, jint count, jint threads) {
+    dvbspy::raiseEvents(msg, ext1, ext2, count, threads);
+}
+
+jobjectArray toStringArray(JNIEnv* env, const std::vector<std::string>& lines) {
+    ScopedLocalRef<jclass> stringClass(env, env->FindClass("java/lang/String"));
+    jobjectArray a =
+            env->NewObjectArray(static_cast<jsize>(lines.size()), stringClass.get(), nullptr);
+    for (size_t i = 0; a != nullptr && i < lines.size(); ++i) {
+        ScopedLocalRef<jstring> s(env, env->NewStringUTF(lines[i].c_str()));
+        env->SetObjectArrayElement(a, static_cast<jsize>(i), s.get());
+    }
+    return a;
+}
+
+jobjectArray Spy_takeLogs(JNIEnv* env, jclass) {
+    std::vector<std::string> lines;
+    {
+        std::lock_guard<std::mutex> lock(gLock);
+        lines.swap(gLogs);
+    }
+    return toStringArray(env, lines);
+}
+
+jobjectArray Spy_takeGlobalRefEvents(JNIEnv* env, jclass) {
+    std::vector<std::string> events;
+    {
+        std::lock_guard<std::mutex> lock(gLock);
+        events.swap(gRefEvents);
+    }
+    return toStringArray(env, events);
+}
+
+void Spy_trackGlobalRefs(JNIEnv* env, jclass) {
+    if (gOriginal == nullptr) {
+        ScopedLocalRef<jclass> cls(env, env->FindClass("java/lang/Class"));
+        gClassClass = static_cast<jclass>(env->NewGlobalRef(cls.get()));
+        gOriginal = env->functions;
+        gHooked = *env->functions;
+        gHooked.NewGlobalRef = hookedNewGlobalRef;
+        gHooked.DeleteGlobalRef = hookedDeleteGlobalRef;
+        dvbspy::setAttachHook(hookThread);
+    }
+    hookThread(env);
+}
+
+// Runs libDVBjni's JNI_OnLoad once more in this VM (registration is idempotent) and returns
+// its result, which Java cannot see from System.loadLibrary.
+jint Spy_callOnLoad(JNIEnv* env, jclass) {
+    void* lib = dlopen("libDVBjni.so", RTLD_NOW | RTLD_NOLOAD);
+    if (lib == nullptr) return 0;
+    auto onLoad = reinterpret_cast<jint (*)(JavaVM*, void*)>(dlsym(lib, "JNI_OnLoad"));
+    JavaVM* vm = nullptr;
+    env->GetJavaVM(&vm);
+    jint result = onLoad != nullptr ? onLoad(vm, nullptr) : 0;
+    dlclose(lib);
+    return result;
+}
+
+jint Spy_pointerSize(JNIEnv*, jclass) {
+    return static_cast<jint>(sizeof(void*));
+}
+
+const JNINativeMethod gMethods[] = {
+        MAKE_JNI_NATIVE_METHOD("reset", "()V", Spy_reset),
+        MAKE_JNI_NATIVE_METHOD("callCount", "()I", Spy_callCount),
+        MAKE_JNI_NATIVE_METHOD("op", "(I)Ljava/lang/String;", Spy_op),
+        MAKE_JNI_NATIVE_METHOD("args", "(I)[J", Spy_args),
+        MAKE_JNI_NATIVE_METHOD("recordCount", "(I)I", Spy_recordCount),
+        MAKE_JNI_NATIVE_METHOD("record", "(II)[B", Spy_record),
+        MAKE_JNI_NATIVE_METHOD("owner", "(I)J", Spy_owner),
+        MAKE_JNI_NATIVE_METHOD("setResult", "(Ljava/lang/String;I)V", Spy_setResult),
+        MAKE_JNI_NATIVE_METHOD("setOut", "(Ljava/lang/String;II[B)V", Spy_setOut),
+        MAKE_JNI_NATIVE_METHOD("setList", "(Ljava/lang/String;[[B)V", Spy_setList),
+        MAKE_JNI_NATIVE_METHOD("omit", "([Ljava/lang/String;)V", Spy_omit),
+        MAKE_JNI_NATIVE_METHOD("liveDvbs", "()[J", Spy_liveDvbs),
+        MAKE_JNI_NATIVE_METHOD("liveDvbCount", "()I", Spy_liveDvbCount),
+        MAKE_JNI_NATIVE_METHOD("strongCount", "(J)I", Spy_strongCount),
+        MAKE_JNI_NATIVE_METHOD("hasListener", "(J)Z", Spy_hasListener),
+        MAKE_JNI_NATIVE_METHOD("liveListenerCount", "()I", Spy_liveListenerCount),
+        MAKE_JNI_NATIVE_METHOD("raise", "(IIIII)V", Spy_raise),
+        MAKE_JNI_NATIVE_METHOD("takeLogs", "()[Ljava/lang/String;", Spy_takeLogs),
+        MAKE_JNI_NATIVE_METHOD("takeGlobalRefEvents", "()[Ljava/lang/String;",
+                               Spy_takeGlobalRefEvents),
+        MAKE_JNI_NATIVE_METHOD("trackGlobalRefs", "()V", Spy_trackGlobalRefs),
+        MAKE_JNI_NATIVE_METHOD("pointerSize", "()I", Spy_pointerSize),
+        MAKE_JNI_NATIVE_METHOD("callOnLoad", "()I", Spy_callOnLoad),
+};
+
+}  // namespace
+
+jint JNI_OnLoad(JavaVM* vm, void*) {
+    __android_log_set_logger(captureLog);
+    __android_log_set_minimum_priority(ANDROID_LOG_VERBOSE);
+    gEchoLogs = getenv("DVB_TEST_ECHO_LOGS") != nullptr;
+    JNIEnv* env = nullptr;
+    if (vm->GetEnv(reinterpret_cast<void**>(&env), JNI_VERSION_1_4) != JNI_OK) return -1;
+    // The class is optional: the load-failure checks use only the log capture.
+    ScopedLocalRef<jclass> spy(env, env->FindClass("android/DVB/Spy"));
+    if (spy.get() == nullptr) {
+        env->ExceptionClear();
+        return JNI_VERSION_1_4;
+    }
+    if (env->RegisterNatives(spy.get(), gMethods, NELEM(gMethods)) != JNI_OK) return -1;
+    return JNI_VERSION_1_4;
+}
+
+// Lets a load-failure check read the captured lines without the Spy class.
+extern "C" JNIEXPORT jobjectArray JNICALL Java_dvbtest_LoadCheck_takeLogs(JNIEnv* env, jclass) {
+    return Spy_takeLogs(env, nullptr);
+}
