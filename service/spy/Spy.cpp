@@ -3,6 +3,7 @@
 #include <android_runtime/AndroidRuntime.h>
 
 #include <algorithm>
+#include <atomic>
 #include <cstring>
 #include <map>
 #include <mutex>
@@ -31,6 +32,8 @@ struct State {
     void (*attachHook)(JNIEnv*) = nullptr;
 };
 
+std::atomic<bool> gQuiet{false};
+
 State& state() {
     static State* s = new State;  // never destroyed: service threads may outlive main()
     return *s;
@@ -56,6 +59,7 @@ Arg P(const void* p, size_t size) {
 
 int32_t record(const char* op, const android::DVB* owner, std::initializer_list<Arg> args,
                std::vector<uint8_t>* extraRecord = nullptr) {
+    if (gQuiet.load(std::memory_order_relaxed)) return 0;
     State& s = state();
     std::lock_guard<std::mutex> lock(s.lock);
     Call call{op, owner, {}, {}};
@@ -86,6 +90,7 @@ int32_t record(const char* op, const android::DVB* owner, std::initializer_list<
 
 template <typename Node>
 void handOutList(const char* op, std::vector<Node>& block, Node** head) {
+    if (gQuiet.load(std::memory_order_relaxed)) return;
     State& s = state();
     std::lock_guard<std::mutex> lock(s.lock);
     block.clear();
@@ -277,6 +282,7 @@ public:
     // Records, instead of the buffer's 1930792 bytes, one byte: 1 when it was all zero on
     // entry. Scripted patches are written into the buffer.
     int32_t GetData(int32_t h, void* data) override {
+        if (gQuiet.load(std::memory_order_relaxed)) return 0;
         const auto* b = static_cast<const uint8_t*>(data);
         bool zero = data != nullptr && b[0] == 0 && memcmp(b, b + 1, sizeof(SUBTTL_Data) - 1) == 0;
         std::vector<uint8_t> flag{static_cast<uint8_t>(zero ? 1 : 0)};
@@ -317,6 +323,7 @@ public:
     }
     // Writes the predictable teletextByte() stream; the destination is not recorded.
     int32_t GetData(int32_t h, int32_t offset, int32_t count, uint8_t* dst) override {
+        if (gQuiet.load(std::memory_order_relaxed)) return 0;
         int32_t r = record("Teltxt::GetData", mOwner, {V(h), V(offset), V(count), V(0)});
         if (dst != nullptr) {
             int32_t n = std::clamp(count, 0, kTeltxtChunk);
@@ -399,6 +406,8 @@ void setList(const std::string& op, const std::vector<std::vector<uint8_t>>& nod
     std::lock_guard<std::mutex> lock(s.lock);
     s.lists[op] = nodes;
 }
+
+void setQuiet(bool quiet) { gQuiet.store(quiet); }
 
 void setAttachHook(void (*hook)(JNIEnv*)) {
     State& s = state();

@@ -56,6 +56,10 @@ inline uint8_t teletextByte(int64_t position) {
 // for them.
 void raiseEvents(int msg, int ext1, int ext2, int count, int threads);
 
+// In quiet mode every operation answers 0 at once: nothing is recorded, scripted or written.
+// Benchmarks use it to measure the library's own cost.
+void setQuiet(bool quiet);
+
 // Called with the environment of every service thread right after it attaches.
 void setAttachHook(void (*hook)(JNIEnv*));
 
