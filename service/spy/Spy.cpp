@@ -407,7 +407,9 @@ void setList(const std::string& op, const std::vector<std::vector<uint8_t>>& nod
     s.lists[op] = nodes;
 }
 
-void setQuiet(bool quiet) { gQuiet.store(quiet); }
+void setQuiet(bool quiet) {
+    gQuiet.store(quiet);
+}
 
 void setAttachHook(void (*hook)(JNIEnv*)) {
     State& s = state();
