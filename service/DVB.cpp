@@ -17,6 +17,10 @@ namespace {
 struct Entry {
     android::DVB* dvb;
     android::wp<android::DVB> ref;
+    // Set once a listener has been installed, which happens through a strong reference. Until
+    // then the object may still be under construction with no strong reference at all, and
+    // promoting it would take and drop the first one, destroying it.
+    bool published;
 };
 
 std::mutex gRegistryLock;
@@ -24,10 +28,12 @@ std::vector<Entry> gLive;
 std::vector<android::wp<android::DVBListener>> gListeners;
 Backend* gBackend = nullptr;
 
-void noteListener(const android::sp<android::DVBListener>& listener) {
-    if (listener == nullptr) return;
+void noteListener(android::DVB* dvb, const android::sp<android::DVBListener>& listener) {
     std::lock_guard<std::mutex> lock(gRegistryLock);
-    gListeners.emplace_back(listener);
+    for (Entry& e : gLive) {
+        if (e.dvb == dvb) e.published = true;
+    }
+    if (listener != nullptr) gListeners.emplace_back(listener);
 }
 
 // With DVB_SERVICE_HEARTBEAT_MS set, the service raises event (kHeartbeatEvent, n, 0) on every
@@ -66,6 +72,7 @@ std::vector<android::sp<android::DVB>> liveDvbs() {
     for (Entry& e : gLive) {
         // An object whose last strong reference is gone stays listed until its destructor
         // has run; promoting fails for it instead of reviving it.
+        if (!e.published) continue;
         android::sp<android::DVB> dvb = e.ref.promote();
         if (dvb != nullptr) out.push_back(dvb);
     }
@@ -109,7 +116,7 @@ DVB::DVB() : mService(nullptr), mFlags(0) {
     {
         std::lock_guard<std::mutex> lock(dvbsvc::gRegistryLock);
         backend = dvbsvc::gBackend;
-        dvbsvc::gLive.push_back({this, wp<DVB>(this)});
+        dvbsvc::gLive.push_back({this, wp<DVB>(this), false});
     }
     if (backend == nullptr) backend = &dvbspy::backend();
     backend->createModules(*this);
@@ -140,7 +147,7 @@ status_t DVB::setListener(const sp<DVBListener>& listener) {
     old = mListener;
     mListener = listener;
     pthread_mutex_unlock(&mLock);
-    dvbsvc::noteListener(listener);
+    dvbsvc::noteListener(this, listener);
     // `old` goes here, outside the lock: its destructor calls into Java.
     return OK;
 }

@@ -18,7 +18,8 @@ public:
 // Makes `backend` the one that later DVB objects get their modules from (null: the default).
 void setBackend(Backend* backend);
 
-// The DVB objects alive now, in creation order. Each entry is a strong reference.
+// The DVB objects alive now that have had a listener installed, in creation order. Each
+// entry is a strong reference.
 std::vector<android::sp<android::DVB>> liveDvbs();
 size_t liveDvbCount();
 
