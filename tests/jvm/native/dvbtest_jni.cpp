@@ -11,6 +11,7 @@
 #include <spy/Spy.h>
 
 #include <dlfcn.h>
+#include <link.h>
 #include <pthread.h>
 
 #include <cstdio>
@@ -282,6 +283,29 @@ jint Spy_callOnLoad(JNIEnv* env, jclass) {
     return result;
 }
 
+// Entry `index` of the cache that libDVBjni exports as `symbol`, `size` bytes per entry; null
+// when the library exports no such name or the entry lies outside the exported object.
+jbyteArray Spy_cacheEntry(JNIEnv* env, jclass, jstring symbol, jint index, jint size) {
+    ScopedUtfChars name(env, symbol);
+    if (name.c_str() == nullptr || index < 0 || size <= 0) return nullptr;
+    void* lib = dlopen("libDVBjni.so", RTLD_NOW | RTLD_NOLOAD);
+    if (lib == nullptr) return nullptr;
+    const auto* base = static_cast<const uint8_t*>(dlsym(lib, name.c_str()));
+    Dl_info info;
+    ElfW(Sym)* sym = nullptr;
+    bool found = base != nullptr &&
+                 dladdr1(base, &info, reinterpret_cast<void**>(&sym), RTLD_DL_SYMENT) != 0 &&
+                 sym != nullptr;
+    dlclose(lib);
+    if (!found || (int64_t{index} + 1) * size > static_cast<int64_t>(sym->st_size)) return nullptr;
+    jbyteArray a = env->NewByteArray(size);
+    if (a != nullptr) {
+        env->SetByteArrayRegion(a, 0, size,
+                                reinterpret_cast<const jbyte*>(base + int64_t{index} * size));
+    }
+    return a;
+}
+
 jint Spy_pointerSize(JNIEnv*, jclass) {
     return static_cast<jint>(sizeof(void*));
 }
@@ -310,6 +334,7 @@ const JNINativeMethod gMethods[] = {
         MAKE_JNI_NATIVE_METHOD("trackGlobalRefs", "()V", Spy_trackGlobalRefs),
         MAKE_JNI_NATIVE_METHOD("pointerSize", "()I", Spy_pointerSize),
         MAKE_JNI_NATIVE_METHOD("callOnLoad", "()I", Spy_callOnLoad),
+        MAKE_JNI_NATIVE_METHOD("cacheEntry", "(Ljava/lang/String;II)[B", Spy_cacheEntry),
 };
 
 }  // namespace

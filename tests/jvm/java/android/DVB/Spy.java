@@ -31,4 +31,5 @@ final class Spy {
     static native void trackGlobalRefs();
     static native int pointerSize();
     static native int callOnLoad();
+    static native byte[] cacheEntry(String symbol, int index, int size);
 }
