@@ -1,8 +1,8 @@
 // Pins the vtable slot of every module operation: the service library's binary interface.
 // On the Itanium C++ ABI a pointer to a virtual member function holds 1 + the byte offset of
-// its slot. Every module starts with RefBase's six slots (two destructor entries, onFirstRef,
-// onLastStrongRef, onIncStrongAttempted, onLastWeakRef); operation k of the module's own order
-// is slot 5 + k.
+// its slot (on ARM, the offset itself, with the flag in the adjustment). Every module starts
+// with RefBase's six slots (two destructor entries, onFirstRef, onLastStrongRef,
+// onIncStrongAttempted, onLastWeakRef); operation k of the module's own order is slot 5 + k.
 #include <DVB.h>
 #include <gtest/gtest.h>
 
@@ -13,10 +13,17 @@ namespace {
 template <typename F>
 long slotOf(F member) {
     static_assert(sizeof(F) == 2 * sizeof(void*), "Itanium member function pointer");
-    uintptr_t raw;
-    memcpy(&raw, &member, sizeof raw);
-    EXPECT_EQ(raw & 1u, 1u) << "not a virtual function";
-    return static_cast<long>((raw - 1) / sizeof(void*));
+    uintptr_t raw[2];
+    memcpy(raw, &member, sizeof raw);
+#if defined(__arm__) || defined(__aarch64__)
+    // The ARM variant keeps the virtual flag in the low bit of the adjustment and the plain
+    // byte offset in the pointer.
+    EXPECT_EQ(raw[1] & 1u, 1u) << "not a virtual function";
+    return static_cast<long>(raw[0] / sizeof(void*));
+#else
+    EXPECT_EQ(raw[0] & 1u, 1u) << "not a virtual function";
+    return static_cast<long>((raw[0] - 1) / sizeof(void*));
+#endif
 }
 
 constexpr long kFirstOwnSlot = 6;  // RefBase's slots come first
