@@ -82,7 +82,7 @@ const dvbjni::JavaField kRegionDefFields[] = {
 
 // The nine integers come first and are written by the map; the pixels and the object count
 // depend on the region's size and are set by Subttl_GetRegionData itself.
-const dvbjni::JavaField kRegionFields[] = {
+constexpr dvbjni::JavaField kRegionFields[] = {
         JF_INT(SUBTTL_Region_t, i_id, "i_id"),
         JF_INT(SUBTTL_Region_t, i_version, "i_version"),
         JF_INT(SUBTTL_Region_t, i_x, "i_x"),
@@ -100,6 +100,10 @@ constexpr size_t kRegionHeight = 5;
 constexpr size_t kRegionInts = 9;
 constexpr size_t kRegionPixbuf = 9;
 constexpr size_t kRegionObjectDefs = 10;
+static_assert(kRegionFields[kRegionWidth].offset == offsetof(SUBTTL_Region_t, i_width) &&
+              kRegionFields[kRegionHeight].offset == offsetof(SUBTTL_Region_t, i_height) &&
+              kRegionFields[kRegionPixbuf].offset == offsetof(SUBTTL_Region_t, p_pixbuf) &&
+              kRegionFields[kRegionObjectDefs].offset == offsetof(SUBTTL_Region_t, i_object_defs));
 
 const dvbjni::JavaField kObjectDefFields[] = {
         JF_INT(SUBTTL_ObjectDef, i_id, "i_id"),
@@ -134,7 +138,7 @@ constexpr dvbjni::JavaField colourField(const char* name, size_t offset) {
 #define JF_COLOURS(member, javaName) \
     colourField<DVB_FIELD_TYPE(SUBTTL_Clut, member)>(javaName, offsetof(SUBTTL_Clut, member))
 
-const dvbjni::JavaField kClutFields[] = {
+constexpr dvbjni::JavaField kClutFields[] = {
         JF_INT(SUBTTL_Clut, i_id, "i_id"),            // u8
         JF_INT(SUBTTL_Clut, i_version, "i_version"),  // u8
         JF_COLOURS(c_2b, "c_2b"),                     // 4 colours
@@ -145,6 +149,9 @@ constexpr size_t kClutIds = 2;
 constexpr size_t kClut2b = 2;
 constexpr size_t kClut4b = 3;
 constexpr size_t kClut8b = 4;
+static_assert(kClutFields[kClut2b].offset == offsetof(SUBTTL_Clut, c_2b) &&
+              kClutFields[kClut4b].offset == offsetof(SUBTTL_Clut, c_4b) &&
+              kClutFields[kClut8b].offset == offsetof(SUBTTL_Clut, c_8b));
 
 // ---- decoder control ---------------------------------------------------------------------
 

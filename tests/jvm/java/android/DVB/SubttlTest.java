@@ -243,22 +243,6 @@ class SubttlTest extends SpyTestBase {
         return r;
     }
 
-    @Test
-    void regionDeliversItsIntegersPixelsAndObjectCount() {
-        byte[] pixels = pixelPattern();
-        script(region(4), le32(21, 22, -23, 24, 3, 2, 27, 28, 29));
-        script(region(4) + 36, pixels);
-        script(region(4) + 36 + PIXELS, le32(16));
-        getData(0);
-        Subttl.SUBTTL_Region_t r = staleRegion();
-        assertEquals(0, subttl().Subttl_GetRegionData(4, r));
-        assertEquals(Arrays.asList(21, 22, -23, 24, 3, 2, 27, 28, 29, 16),
-                Arrays.asList(r.i_id, r.i_version, r.i_x, r.i_y, r.i_width, r.i_height,
-                        r.i_level_comp, r.i_depth, r.i_clut, r.i_object_defs));
-        assertArrayEquals(Arrays.copyOf(pixels, 6), r.p_pixbuf);
-        assertNoLogs();
-    }
-
     /** Width, height; then the size Java is told and the pixels it gets (-1: left as it was). */
     static Stream<Arguments> regionSizes() {
         return Stream.of(
