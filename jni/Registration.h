@@ -13,6 +13,12 @@ DVB_EXPORT int register_android_dvb_Cfg(JNIEnv* env);
 DVB_EXPORT int register_android_dvb_Subttl(JNIEnv* env);
 DVB_EXPORT int register_android_dvb_Teltxt(JNIEnv* env);
 
+// Module callbacks that the library exports for the service's use; nothing in the library calls
+// or installs them.
+DVB_EXPORT void Scnmnotify(int, int, int);
+DVB_EXPORT int Strmcallback(void*, int, int);
+DVB_EXPORT int Subttlcallback(void*, int, int);
+
 namespace dvbjni {
 
 // Finds `className` and its int field mNativeContext, storing the field ID in `*contextField`

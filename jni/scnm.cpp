@@ -291,6 +291,8 @@ static_assert(NELEM(gMethods) == 12, "android.DVB.Scnm declares 12 natives");
 
 }  // namespace
 
+void Scnmnotify(int, int, int) {}
+
 int register_android_dvb_Scnm(JNIEnv* env) {
     if (!dvbjni::findContextField(env, "android/DVB/Scnm", "Can't find android/DVB/Scnm",
                                   "Can't find Tuner.mNativeContext", &gContext)) {

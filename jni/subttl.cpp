@@ -335,6 +335,10 @@ static_assert(NELEM(gMethods) == 11, "android.DVB.Subttl declares 11 natives");
 
 }  // namespace
 
+int Subttlcallback(void*, int, int) {
+    return 0;
+}
+
 int register_android_dvb_Subttl(JNIEnv* env) {
     if (!dvbjni::findContextField(env, "android/DVB/Subttl", "Can't find android/DVB/Subttl",
                                   "Can't find Tuner.mNativeContext", &gContext)) {
