@@ -1,6 +1,7 @@
 // The Java class android.DVB.Strm: stream playback, its settings, status and components, the
 // present and following events of a stream and the event database, on the stream module.
 #include <DVB.h>
+#include <android/log.h>
 #include <android_runtime/AndroidRuntime.h>
 #include <nativehelper/JNIHelp.h>
 #include <nativehelper/jni_macros.h>
@@ -24,7 +25,8 @@ using dvbjni::requireModule;
 using dvbjni::requireObject;
 
 // Exported caches, zero at load. Strm_CreatStreamInfo overwrites the first `count` entries of
-// each component list and the CA system ids. Entries beyond a count keep what an earlier query
+// each component list and the CA system ids; Strm_GetAllEvent and EPG_GetEvent overwrite the
+// first `itemCount` extended-event items. Entries beyond a count keep what an earlier query
 // left. Java serialises a query and the reads that follow it, so no lock guards them.
 extern "C" {
 DVB_EXPORT VideoContent videoContents[kStreamComponents];
@@ -32,9 +34,13 @@ DVB_EXPORT AudioContent audioContents[kStreamComponents];
 DVB_EXPORT SubtitleContent subtitleContents[kStreamComponents];
 DVB_EXPORT TeletextContent teletextContents[kStreamComponents];
 DVB_EXPORT uint16_t caSysId[3];
+DVB_EXPORT ExtEpgEventItem EpgExtentItemNow[kExtEpgItems];
+DVB_EXPORT ExtEpgEventItem EpgExtentItemNext[kExtEpgItems];
 }
 
 namespace {
+
+constexpr const char* kTag = "STRM";
 
 jfieldID gContext;          // Strm.mNativeContext
 dvbjni::StaticMutex sLock;  // created and destroyed with the library; never locked
@@ -410,6 +416,195 @@ jint Strm_GetTeleTextStreamInfo(JNIEnv* env, jobject thiz, jint index, jobject c
                           teletextContents);
 }
 
+// ---- event information ---------------------------------------------------------------------
+
+constexpr const char* kEpgEventClass = "android/DVB/Strm$EpgEvent";
+constexpr const char* kExtEpgEventClass = "android/DVB/Strm$ExtEpgEvent";
+constexpr const char* kExtEpgEventItemClass = "android/DVB/Strm$ExtEpgEventItem";
+constexpr const char* kEpgSvcClass = "android/DVB/Strm$EpgSvc";
+constexpr const char* kServiceCheckClass = "android/DVB/Strm$ServiceCheck";
+
+// `name` and `text` reach Java as exactly their bytes, in every method that delivers an event:
+// broadcast text selects its own character table with a leading byte (EN 300 468 Annex A),
+// which modified UTF-8 does not describe, so only the app can decode it with the right table.
+const JavaField kEpgEventFields[] = {
+        JF_INT(EpgEvent, evtId, "evtId"),
+        JF_INT(EpgEvent, startTime, "startTime"),
+        JF_INT(EpgEvent, duration, "duration"),
+        JF_INT(EpgEvent, runStatus, "runStatus"),
+        JF_INT(EpgEvent, parentalRating, "parentalRating"),
+        JF_INT(EpgEvent, content, "content"),
+        JF_INT(EpgEvent, refSvcId, "refSvcId"),
+        JF_INT(EpgEvent, refEvtId, "refEvtId"),
+        JF_TEXT(EpgEvent, name, "name", Bytes),
+        JF_TEXT(EpgEvent, text, "text", Bytes),
+        JF_INT(EpgEvent, extendedFlag, "extendedFlag"),
+};
+
+const JavaField kExtEpgEventFields[] = {
+        JF_INT(ExtEpgEvent, itemCount, "itemCount"),
+        JF_TEXT(ExtEpgEvent, text, "text", Text),
+};
+
+const JavaField kExtEpgEventItemFields[] = {
+        JF_TEXT(ExtEpgEventItem, itemDesc, "itemDesc", TextOrNull),
+        JF_TEXT(ExtEpgEventItem, itemText, "type", TextOrNull),
+};
+
+// EPG_GetEvent names the service by its three ids; the indexes and the type stay 0.
+const JavaField kEpgSvcIdFields[] = {
+        JF_INT(EpgSvc, svcId, "svcId"),
+        JF_INT(EpgSvc, tsId, "tsId"),
+        JF_INT(EpgSvc, onId, "onId"),
+};
+
+const JavaField kEpgSvcFields[] = {
+        JF_INT(EpgSvc, svcId, "svcId"),       JF_INT(EpgSvc, tsId, "tsId"),
+        JF_INT(EpgSvc, onId, "onId"),         JF_INT(EpgSvc, tpIndex, "tpIndex"),
+        JF_INT(EpgSvc, netIndex, "netIndex"), JF_INT(EpgSvc, netType, "netType"),
+};
+
+const JavaField kServiceCheckFields[] = {
+        JF_INT(ServiceCheck, satPosition, "satPosition"),
+        JF_INT(ServiceCheck, freq, "freq"),
+        JF_INT(ServiceCheck, tsid, "tsid"),
+        JF_INT(ServiceCheck, sid, "sid"),
+};
+
+// The record and each cache hold 16 items: a larger itemCount is cut to 16 in the record, so
+// that Java is told how many items were copied.
+void boundItemCount(ExtEpgEvent* ext) {
+    if (ext->itemCount > static_cast<uint32_t>(kExtEpgItems)) ext->itemCount = kExtEpgItems;
+}
+
+// Overwrites the first itemCount entries of `cache`; the later ones keep older items.
+void copyItems(const ExtEpgEvent& ext, ExtEpgEventItem (&cache)[kExtEpgItems], bool log) {
+    for (uint32_t k = 0; k < ext.itemCount; ++k) {
+        const ExtEpgEventItem& item = ext.items[k];
+        if (log) {
+            // Either field may fill its width without a zero byte.
+            __android_log_print(ANDROID_LOG_VERBOSE, kTag, "mExtEvtNow item: %.*s itemDesc : %.*s",
+                                static_cast<int>(sizeof item.itemText), item.itemText,
+                                static_cast<int>(sizeof item.itemDesc), item.itemDesc);
+        }
+        cache[k] = item;
+    }
+}
+
+// Returns 0 whatever the module answered. Both caches get their items, with one log line for
+// each item copied (the following event's lines read "mExtEvtNow" too).
+jint Strm_GetAllEvent(JNIEnv* env, jobject thiz, jlong handle, jobject present, jobject following,
+                      jobject presentExt, jobject followingExt) {
+    sp<Strm> strm = requireModule(env, getStrm(env, thiz));
+    if (strm == nullptr) return -1;
+    Output outputs[] = {
+            {present, kEpgEventClass, kEpgEventFields},
+            {following, kEpgEventClass, kEpgEventFields},
+            {presentExt, kExtEpgEventClass, kExtEpgEventFields},
+            {followingExt, kExtEpgEventClass, kExtEpgEventFields},
+    };
+    if (!prepareAll(env, outputs)) return -1;
+    EpgEvent now{};
+    EpgEvent next{};
+    ExtEpgEvent nowExt{};
+    ExtEpgEvent nextExt{};
+    strm->GetAllEvent(lowHandle(handle), &now, &next, &nowExt, &nextExt);
+    boundItemCount(&nowExt);
+    boundItemCount(&nextExt);
+    if (!outputs[0].write(env, &now) || !outputs[1].write(env, &next) ||
+        !outputs[2].write(env, &nowExt) || !outputs[3].write(env, &nextExt)) {
+        return -1;
+    }
+    copyItems(nowExt, EpgExtentItemNow, true);
+    copyItems(nextExt, EpgExtentItemNext, true);
+    return 0;
+}
+
+// Returns 0 whatever the module answered.
+jint Strm_GetEvent(JNIEnv* env, jobject thiz, jlong handle, jobject event) {
+    sp<Strm> strm = requireModule(env, getStrm(env, thiz));
+    if (strm == nullptr) return -1;
+    Output out(event, kEpgEventClass, kEpgEventFields);
+    if (!out.prepare(env)) return -1;
+    EpgEvent rec{};
+    strm->GetEvent(lowHandle(handle), &rec);
+    return out.write(env, &rec) ? 0 : -1;
+}
+
+jint Strm__GetExtEPGEventNow(JNIEnv* env, jobject thiz, jint index, jobject item) {
+    return readCacheEntry(env, thiz, index, item, kExtEpgEventItemClass, kExtEpgEventItemFields,
+                          EpgExtentItemNow);
+}
+
+jint Strm__GetExtEPGEventNext(JNIEnv* env, jobject thiz, jint index, jobject item) {
+    return readCacheEntry(env, thiz, index, item, kExtEpgEventItemClass, kExtEpgEventItemFields,
+                          EpgExtentItemNext);
+}
+
+// The module's 32-bit time, zero-extended: 4294967295 is a time, -1 means no module.
+jlong Strm_GetTime(JNIEnv* env, jobject thiz, jlong handle, jlong /* unused */) {
+    sp<Strm> strm = requireModule(env, getStrm(env, thiz));
+    if (strm == nullptr) return -1;
+    uint32_t time = 0;
+    strm->GetTime(lowHandle(handle), &time);
+    return static_cast<jlong>(time);
+}
+
+// Returns 0 whatever the module answered. The items go to EpgExtentItemNow, which the present
+// event of Strm_GetAllEvent shares; no log line.
+jint EPG_GetEvent(JNIEnv* env, jobject thiz, jlong handle, jobject service, jobject event,
+                  jobject ext) {
+    sp<Strm> strm = requireModule(env, getStrm(env, thiz));
+    if (strm == nullptr) return -1;
+    EpgSvc svc{};
+    if (!dvbjni::readFields(env, service, kEpgSvcClass, kEpgSvcIdFields, &svc)) return -1;
+    Output outputs[] = {
+            {event, kEpgEventClass, kEpgEventFields},
+            {ext, kExtEpgEventClass, kExtEpgEventFields},
+    };
+    if (!prepareAll(env, outputs)) return -1;
+    EpgEvent rec{};
+    ExtEpgEvent extRec{};
+    strm->EPG_GetEvent(&svc, lowHandle(handle), &rec, &extRec);
+    boundItemCount(&extRec);
+    if (!outputs[0].write(env, &rec) || !outputs[1].write(env, &extRec)) return -1;
+    copyItems(extRec, EpgExtentItemNow, false);
+    return 0;
+}
+
+jint EPG_ExtGetEvent(JNIEnv* env, jobject thiz, jint index, jobject item) {
+    return readCacheEntry(env, thiz, index, item, kExtEpgEventItemClass, kExtEpgEventItemFields,
+                          EpgExtentItemNow);
+}
+
+// Returns 0 whatever the module answered.
+jint EpgMd_AddService(JNIEnv* env, jobject thiz, jobject service) {
+    sp<Strm> strm = requireModule(env, getStrm(env, thiz));
+    if (strm == nullptr) return -1;
+    EpgSvc rec{};
+    if (!dvbjni::readFields(env, service, kEpgSvcClass, kEpgSvcFields, &rec)) return -1;
+    strm->EpgMd_AddService(&rec);
+    return 0;
+}
+
+// Returns 0 whatever the module answered.
+jint EpgMd_ClearService(JNIEnv* env, jobject thiz) {
+    sp<Strm> strm = requireModule(env, getStrm(env, thiz));
+    if (strm == nullptr) return -1;
+    strm->EpgMd_ClearService();
+    return 0;
+}
+
+// The outcome of the check does not reach Java: 0 whatever the module answered.
+jint Strm_CheckService(JNIEnv* env, jobject thiz, jobject check) {
+    sp<Strm> strm = requireModule(env, getStrm(env, thiz));
+    if (strm == nullptr) return -1;
+    ServiceCheck rec{};
+    if (!dvbjni::readFields(env, check, kServiceCheckClass, kServiceCheckFields, &rec)) return -1;
+    strm->CheckService(&rec);
+    return 0;
+}
+
 const JNINativeMethod gMethods[] = {
         MAKE_JNI_NATIVE_METHOD("Strm_Init", "()I", Strm_Init),
         MAKE_JNI_NATIVE_METHOD("Strm_Open", "(Landroid/DVB/Strm$STRM_OpenSettings;)J", Strm_Open),
@@ -441,8 +636,29 @@ const JNINativeMethod gMethods[] = {
         MAKE_JNI_NATIVE_METHOD("Strm_GetTeleTextStreamInfo",
                                "(ILandroid/DVB/Strm$TeletextContent;)I",
                                Strm_GetTeleTextStreamInfo),
+        MAKE_JNI_NATIVE_METHOD("Strm_GetAllEvent",
+                               "(JLandroid/DVB/Strm$EpgEvent;Landroid/DVB/Strm$EpgEvent;"
+                               "Landroid/DVB/Strm$ExtEpgEvent;Landroid/DVB/Strm$ExtEpgEvent;)I",
+                               Strm_GetAllEvent),
+        MAKE_JNI_NATIVE_METHOD("Strm_GetEvent", "(JLandroid/DVB/Strm$EpgEvent;)I", Strm_GetEvent),
+        MAKE_JNI_NATIVE_METHOD("Strm__GetExtEPGEventNow", "(ILandroid/DVB/Strm$ExtEpgEventItem;)I",
+                               Strm__GetExtEPGEventNow),
+        MAKE_JNI_NATIVE_METHOD("Strm__GetExtEPGEventNext", "(ILandroid/DVB/Strm$ExtEpgEventItem;)I",
+                               Strm__GetExtEPGEventNext),
+        MAKE_JNI_NATIVE_METHOD("Strm_GetTime", "(JJ)J", Strm_GetTime),
+        MAKE_JNI_NATIVE_METHOD("EPG_GetEvent",
+                               "(JLandroid/DVB/Strm$EpgSvc;Landroid/DVB/Strm$EpgEvent;"
+                               "Landroid/DVB/Strm$ExtEpgEvent;)I",
+                               EPG_GetEvent),
+        MAKE_JNI_NATIVE_METHOD("EPG_ExtGetEvent", "(ILandroid/DVB/Strm$ExtEpgEventItem;)I",
+                               EPG_ExtGetEvent),
+        MAKE_JNI_NATIVE_METHOD("EpgMd_AddService", "(Landroid/DVB/Strm$EpgSvc;)I",
+                               EpgMd_AddService),
+        MAKE_JNI_NATIVE_METHOD("EpgMd_ClearService", "()I", EpgMd_ClearService),
+        MAKE_JNI_NATIVE_METHOD("Strm_CheckService", "(Landroid/DVB/Strm$ServiceCheck;)I",
+                               Strm_CheckService),
 };
-static_assert(NELEM(gMethods) == 13, "the playback natives of android.DVB.Strm");
+static_assert(NELEM(gMethods) == 23, "android.DVB.Strm declares 23 natives");
 
 }  // namespace
 
