@@ -662,6 +662,10 @@ static_assert(NELEM(gMethods) == 23, "android.DVB.Strm declares 23 natives");
 
 }  // namespace
 
+int Strmcallback(void*, int, int) {
+    return 0;
+}
+
 int register_android_dvb_Strm(JNIEnv* env) {
     if (!dvbjni::findContextField(env, "android/DVB/Strm", "Can't find android/DVB/Strm",
                                   "Can't find Tuner.mNativeContext", &gContext)) {
