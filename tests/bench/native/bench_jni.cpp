@@ -56,8 +56,22 @@ void Bench_raise(JNIEnv*, jclass, jint count, jint threads) {
     dvbspy::raiseEvents(1, 2, 3, count, threads);
 }
 
-// Realistic cache content for the readers: a named service, an audio track with languages.
+// Realistic content for the readers: a named service, an audio track with languages, and
+// colour tables of visible, partly transparent colours.
 void Bench_fillCaches(JNIEnv*, jclass) {
+    uint32_t seed = 12345;
+    auto next = [&seed] { return (seed = seed * 1103515245u + 12345u) >> 16; };
+    for (SUBTTL_Clut* clut : {&Data.cluts[0], &Data.defaultClut}) {
+        SUBTTL_ClutEntry* tables[] = {clut->c_2b, clut->c_4b, clut->c_8b};
+        int sizes[] = {4, 16, 256};
+        for (int t = 0; t < 3; ++t) {
+            for (int i = 0; i < sizes[t]; ++i) {
+                tables[t][i] = {static_cast<uint8_t>(16 + next() % 220),
+                                static_cast<uint8_t>(next()), static_cast<uint8_t>(next()),
+                                static_cast<uint8_t>(next() % 4 == 0 ? 128 : 0)};
+            }
+        }
+    }
     strcpy(s_SvcExt[0].svcName, "Das Erste HD");
     s_SvcExt[0].svcId = 0x283D;
     strcpy(audioContents[0].langCode0, "deu");

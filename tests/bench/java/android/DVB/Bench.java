@@ -79,6 +79,10 @@ final class Bench {
         quick = rest.remove("--quick");
         String out = rest.isEmpty() ? null : rest.get(0);
 
+        // Dvb_SystemInit returns once the event database file exists.
+        String db = System.getProperty("dvb.epgdb");
+        if (db != null && !Files.exists(Paths.get(db))) Files.createFile(Paths.get(db));
+
         DVB dvb = new DVB();
         init();
         quiet(true);
@@ -97,6 +101,7 @@ final class Bench {
             {"Strm_GetAudioStreamInfo"}, {"Scnm_GetServiceList"}, {"Subttl_GetClutData"},
             {"Subttl_GetRegionData"}, {"Teltxt_GetData"},
         };
+        fillCaches(); // Subttl_GetData above cleared the display data
         Map<String, Op> twinOps = f.twins();
         Map<String, double[]> twinRows = new LinkedHashMap<>();
         for (String[] t : twins) {
@@ -133,6 +138,7 @@ final class Bench {
             String.format("%.2f GB/s", 384000 / pixels), String.format("twin: %.0f ns", pixelsTwin),
             String.format("%.2fx", pixels / pixelsTwin)});
         setRegion(0, 0, 0);
+        fillCaches();
         Subttl.SUBTTL_Clut clut = new Subttl.SUBTTL_Clut();
         double clutNs = nsPerCall(() -> f.subttl.Subttl_GetClutData(0, clut));
         bulk.add(new String[] {"Subttl_GetClutData (276 entries)", String.format("%.0f", clutNs),

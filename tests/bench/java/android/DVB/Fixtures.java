@@ -85,7 +85,9 @@ final class Fixtures {
         Map<String, Bench.Op> m = new LinkedHashMap<>();
         DVB scratch = new DVB();
         scratch.release();
-        m.put("native_init", op(() -> NATIVE_INIT.invokeExact()));
+        m.put("native_init", op(() -> {
+            NATIVE_INIT.invokeExact();
+        }));
         m.put("native_setup + native_release", op(() -> {
             NATIVE_SETUP.invoke(scratch, (Object) scratch);
             NATIVE_RELEASE.invoke(scratch);
