@@ -15,6 +15,9 @@ case $mode in
   no-teltxt-field) rename_context Teltxt ;;
   no-dvb-field) rename_context DVB ;;
   no-post-event) sed -i 's/\bpostEventFromNative\b/postEventRenamed/g' "$tmp/DVB.java" ;;
+  no-fields)  # every field of every record class renamed
+    sed -i -E 's/^(        public (int|long|String|byte\[\]|int\[\]) )([A-Za-z_0-9]+);/\1gone_\3;/' \
+      "$tmp"/{Scnm,Strm,Cfg,Subttl,Teltxt}.java ;;
   *) echo "unknown variant $mode" >&2; exit 1 ;;
 esac
 rm -rf "$out"
