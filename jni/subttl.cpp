@@ -212,8 +212,9 @@ jint Subttl_GetRegionDefData(JNIEnv* env, jobject thiz, jint page, jint def, job
 
 // The pixels reach Java in one copy of width x height bytes. A negative size (the 32-bit
 // product, as the device computes it) zeroes the Java size and leaves the pixels and the
-// object count as they were. A size above the pixel buffer delivers the rows that fit and
-// tells Java that height; a negative width with a positive product fits no row.
+// object count as they were. A size above the pixel buffer, as the 32-bit product or as the
+// real one, delivers the rows that fit and tells Java that height; a negative width with a
+// positive product fits no row.
 jint Subttl_GetRegionData(JNIEnv* env, jobject thiz, jint region, jobject out) {
     sp<Subttl> subttl = requireModule(env, getSubttl(env, thiz));
     if (subttl == nullptr || !dvbjni::requireObject(env, out, kRegionClass) ||
@@ -228,17 +229,22 @@ jint Subttl_GetRegionData(JNIEnv* env, jobject thiz, jint region, jobject out) {
     }
     int32_t width = rec.i_width;
     int32_t height = rec.i_height;
-    if (static_cast<int32_t>(static_cast<uint32_t>(width) * static_cast<uint32_t>(height)) < 0) {
+    int32_t size =
+            static_cast<int32_t>(static_cast<uint32_t>(width) * static_cast<uint32_t>(height));
+    if (size < 0) {
         env->SetIntField(out, ids[kRegionWidth], 0);
         env->SetIntField(out, ids[kRegionHeight], 0);
         return 0;
     }
-    if (static_cast<int64_t>(width) * height > kSubttlRegionPixels) {
+    // With opposite signs the real product is negative while the 32-bit one can wrap to any
+    // positive value: both are bounded.
+    if (size > kSubttlRegionPixels || static_cast<int64_t>(width) * height > kSubttlRegionPixels) {
         height = width > 0 ? kSubttlRegionPixels / width : 0;
         env->SetIntField(out, ids[kRegionHeight], height);
+        size = width * height;
     }
-    size_t pixels = static_cast<size_t>(static_cast<int64_t>(width) * height);
-    ScopedLocalRef<jbyteArray> pixbuf(env, dvbjni::newByteArray(env, rec.p_pixbuf, pixels));
+    ScopedLocalRef<jbyteArray> pixbuf(
+            env, dvbjni::newByteArray(env, rec.p_pixbuf, static_cast<size_t>(size)));
     if (pixbuf.get() == nullptr) return -1;
     env->SetObjectField(out, ids[kRegionPixbuf], pixbuf.get());
     env->SetIntField(out, ids[kRegionObjectDefs], rec.i_object_defs);
