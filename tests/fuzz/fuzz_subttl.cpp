@@ -35,8 +35,9 @@ public:
     int32_t Stop(int32_t) override { return 0; }
     int32_t GetData(int32_t, void* data) override {
         FUZZ_CHECK(data == &Data);
-        for (const Patch& p : patches)
+        for (const Patch& p : patches) {
             memcpy(static_cast<uint8_t*>(data) + p.at, p.bytes.data(), p.bytes.size());
+        }
         return 0;
     }
 
