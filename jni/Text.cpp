@@ -1,5 +1,8 @@
 #include "Text.h"
 
+#include <nativehelper/JNIHelp.h>
+
+#include <cstdint>
 #include <cstring>
 
 #include "Errors.h"
@@ -81,6 +84,12 @@ jstring newStringFromField(JNIEnv* env, const char* field, size_t width) {
 }
 
 jbyteArray newByteArray(JNIEnv* env, const void* bytes, size_t length) {
+    // Every caller's length is bounded by a record field; a larger one is a defect that must
+    // not be cut down to a Java size silently.
+    if (length > static_cast<size_t>(INT32_MAX)) {
+        jniThrowException(env, "java/lang/OutOfMemoryError", "byte array too large");
+        return nullptr;
+    }
     jbyteArray array = env->NewByteArray(static_cast<jsize>(length));
     if (array != nullptr && length != 0) {
         env->SetByteArrayRegion(array, 0, static_cast<jsize>(length),

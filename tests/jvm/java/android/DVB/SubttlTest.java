@@ -259,7 +259,9 @@ class SubttlTest extends SpyTestBase {
                 Arguments.of(-2, -200000, -2, 0, 0),
                 Arguments.of(-1, 5, 0, 0, -1),
                 Arguments.of(0x10000, 0x8000, 0, 0, -1),
-                Arguments.of(Integer.MIN_VALUE, 1, 0, 0, -1));
+                Arguments.of(Integer.MIN_VALUE, 1, 0, 0, -1),
+                // Opposite signs: the real product is negative, the 32-bit one wraps to 400000.
+                Arguments.of(2, -2147283648, 2, 192000, PIXELS));
     }
 
     @ParameterizedTest
