@@ -80,10 +80,14 @@ bool readRecord(JNIEnv* env, jobject object, const char* className, const JavaFi
                 // and the zero that the cleared record already holds.
                 ScopedLocalRef<jstring> s(
                         env, static_cast<jstring>(env->GetObjectField(object, ids[i])));
-                char what[96];
-                snprintf(what, sizeof what, "%s.%s", simpleName(className), f.name);
+                if (s.get() == nullptr) {
+                    char what[96];
+                    snprintf(what, sizeof what, "%s.%s", simpleName(className), f.name);
+                    throwNull(env, what);
+                    return false;
+                }
                 size_t limit = f.conv == Conv::LangCode ? 3 : f.width;
-                if (copyStringBytes(env, s.get(), reinterpret_cast<char*>(p), limit, what) < 0) {
+                if (copyStringBytes(env, s.get(), reinterpret_cast<char*>(p), limit, f.name) < 0) {
                     return false;
                 }
                 break;
