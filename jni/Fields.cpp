@@ -26,9 +26,12 @@ bool requireObject(JNIEnv* env, jobject object, const char* className) {
 
 bool FieldIds::lookup(JNIEnv* env, const char* className, const JavaField* map, size_t count) {
     ScopedLocalRef<jclass> cls(env, env->FindClass(className));
-    if (cls.get() == nullptr) return false;
+    return cls.get() != nullptr && lookup(env, cls.get(), map, count);
+}
+
+bool FieldIds::lookup(JNIEnv* env, jclass cls, const JavaField* map, size_t count) {
     for (size_t i = 0; i < count; ++i) {
-        mIds[i] = env->GetFieldID(cls.get(), map[i].name, map[i].signature);
+        mIds[i] = env->GetFieldID(cls, map[i].name, map[i].signature);
         if (mIds[i] == nullptr) return false;
     }
     return true;

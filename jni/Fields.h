@@ -91,6 +91,9 @@ public:
     // leaves its NoClassDefFoundError or NoSuchFieldError pending.
     bool lookup(JNIEnv* env, const char* className, const JavaField* map, size_t count);
 
+    // The same for a class already found, so that two maps of one class share its look-up.
+    bool lookup(JNIEnv* env, jclass cls, const JavaField* map, size_t count);
+
     template <size_t N>
     bool lookup(JNIEnv* env, const char* className, const JavaField (&map)[N]) {
         static_assert(N <= kMax, "map too long");

@@ -1,5 +1,7 @@
 #include "Frontend.h"
 
+#include <nativehelper/scoped_local_ref.h>
+
 namespace dvbjni {
 
 const JavaField kFrontendFields[24] = {
@@ -65,9 +67,20 @@ void fillFrontend(const FrontendValues& v, ANT_FrontendParameters* fe) {
     fe->out5v = static_cast<uint8_t>(v.out5v);
 }
 
-bool readFrontend(JNIEnv* env, jobject object, const char* className, ANT_FrontendParameters* fe) {
+bool readFrontend(JNIEnv* env, jobject object, const char* className, ANT_FrontendParameters* fe,
+                  const JavaField* extra, size_t extraCount, void* extraRecord) {
+    if (!requireObject(env, object, className)) return false;
+    ScopedLocalRef<jclass> cls(env, env->FindClass(className));
+    FieldIds ids;
+    FieldIds extraIds;
     FrontendValues values;
-    if (!readFields(env, object, className, kFrontendFields, &values)) return false;
+    constexpr size_t kCount = sizeof kFrontendFields / sizeof kFrontendFields[0];
+    if (cls.get() == nullptr || !ids.lookup(env, cls.get(), kFrontendFields, kCount) ||
+        !extraIds.lookup(env, cls.get(), extra, extraCount) ||
+        !readRecord(env, object, className, kFrontendFields, ids, kCount, &values) ||
+        !readRecord(env, object, className, extra, extraIds, extraCount, extraRecord)) {
+        return false;
+    }
     fillFrontend(values, fe);
     return true;
 }

@@ -45,6 +45,10 @@ extern const JavaField kFrontendFields[24];
 void fillFrontend(const FrontendValues& v, ANT_FrontendParameters* fe);
 
 // Reads the front-end fields of `object` (of class `className`) and fills `fe` with them.
-bool readFrontend(JNIEnv* env, jobject object, const char* className, ANT_FrontendParameters* fe);
+// `extra` maps further fields of the same class into `extraRecord`, with the same class
+// look-up.
+bool readFrontend(JNIEnv* env, jobject object, const char* className, ANT_FrontendParameters* fe,
+                  const JavaField* extra = nullptr, size_t extraCount = 0,
+                  void* extraRecord = nullptr);
 
 }  // namespace dvbjni

@@ -210,8 +210,8 @@ jint Strm_Start(JNIEnv* env, jobject thiz, jlong handle, jobject service, jobjec
     sp<Strm> strm = requireModule(env, getStrm(env, thiz));
     if (strm == nullptr) return -1;
     STRM_Settings rec{};
-    if (!dvbjni::readFrontend(env, frontEnd, kFrontEndClass, &rec.fe) ||
-        !dvbjni::readFields(env, frontEnd, kFrontEndClass, kOrbitalField, &rec) ||
+    if (!dvbjni::readFrontend(env, frontEnd, kFrontEndClass, &rec.fe, kOrbitalField,
+                              NELEM(kOrbitalField), &rec) ||
         !dvbjni::readFields(env, service, kServiceClass, kServiceFields, &rec) ||
         !dvbjni::readFields(env, langCode, kLangCodeClass, kLangCodeFields, &rec)) {
         return -1;
