@@ -78,18 +78,22 @@ bool readRecord(JNIEnv* env, jobject object, const char* className, const JavaFi
                 break;
             case Conv::Text:
             case Conv::TextOrNull:
-            case Conv::LangCode: {
+            case Conv::LangCode:
+            case Conv::LangCodeOr: {
                 // A longer text is cut at the field's end; a language code keeps three bytes
                 // and the zero that the cleared record already holds.
                 ScopedLocalRef<jstring> s(
                         env, static_cast<jstring>(env->GetObjectField(object, ids[i])));
                 if (s.get() == nullptr) {
+                    if (f.conv == Conv::LangCodeOr) break;  // the record's default stands
                     char what[96];
                     snprintf(what, sizeof what, "%s.%s", simpleName(className), f.name);
                     throwNull(env, what);
                     return false;
                 }
-                size_t limit = f.conv == Conv::LangCode ? 3 : f.width;
+                bool code = f.conv == Conv::LangCode || f.conv == Conv::LangCodeOr;
+                size_t limit = code ? 3 : f.width;
+                if (code) memset(p, 0, 3);  // a shorter code leaves zeros, not the default
                 if (copyStringBytes(env, s.get(), reinterpret_cast<char*>(p), limit, f.name) < 0) {
                     return false;
                 }
@@ -136,7 +140,8 @@ bool writeRecord(JNIEnv* env, jobject object, const JavaField* map, const FieldI
                 }
                 [[fallthrough]];
             case Conv::Text:
-            case Conv::LangCode: {
+            case Conv::LangCode:
+            case Conv::LangCodeOr: {
                 ScopedLocalRef<jstring> s(env, newStringFromField(env, text, f.width));
                 if (s.get() == nullptr) return false;
                 env->SetObjectField(object, ids[i], s.get());

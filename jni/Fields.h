@@ -25,6 +25,7 @@ enum class Conv : uint8_t {
     Text,        // "Ljava/lang/String;" zero-ended text; into the record: cut at the field's end
     TextOrNull,  // "Ljava/lang/String;" as Text, but an empty field reaches Java as null
     LangCode,    // "Ljava/lang/String;" three-byte language code: its first three bytes in
+    LangCodeOr,  // as LangCode, but a null string keeps the code the record already holds
     Bytes,       // "[B" zero-ended text as exactly its bytes, no conversion
     AllBytes,    // "[B" every byte of the field
 };

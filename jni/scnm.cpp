@@ -77,14 +77,12 @@ const dvbjni::JavaField kOpenFields[] = {
         JF_INT(SCNM_OpenSettings, demux, "demux"),
 };
 
-// The scan's own fields after the front-end block. langCode is looked up with them but read
-// apart, since a null code stands for "eng".
+// The scan's own fields after the front-end block; a null langCode leaves the default "eng".
 const dvbjni::JavaField kStartFields[] = {
         JF_INT(SCNM_StartSettings, scanType, "scanType"),
         JF_INT(SCNM_StartSettings, scanNetwrok, "scanNetwrok"),
-        JF_TEXT(SCNM_StartSettings, langCode, "langCode", LangCode),
+        JF_TEXT(SCNM_StartSettings, langCode, "langCode", LangCodeOr),
 };
-constexpr size_t kLangCode = NELEM(kStartFields) - 1;
 
 const dvbjni::JavaField kStatusFields[] = {
         JF_INT(SCNM_GetStatus, feStatus, "feStatus"),
@@ -128,22 +126,12 @@ const dvbjni::JavaField kConfigFields[] = {
 
 // ---- scan control ------------------------------------------------------------------------
 
-// Fills the zeroed `rec`; the reserved words stay 0. The language code keeps its first three
-// bytes, and a shorter code leaves zeros after its own.
+// Fills the zeroed `rec`, with one look-up of the class; the reserved words stay 0. The
+// language code keeps its first three bytes, and a shorter code leaves zeros after its own.
 bool readStartSettings(JNIEnv* env, jobject settings, SCNM_StartSettings* rec) {
-    dvbjni::FieldIds ids;
-    if (!dvbjni::readFrontend(env, settings, kStartClass, &rec->fe) ||
-        !ids.lookup(env, kStartClass, kStartFields) ||
-        !dvbjni::readRecord(env, settings, kStartClass, kStartFields, ids, kLangCode, rec)) {
-        return false;
-    }
-    ScopedLocalRef<jstring> code(
-            env, static_cast<jstring>(env->GetObjectField(settings, ids[kLangCode])));
-    if (code.get() == nullptr) {
-        memcpy(rec->langCode, "eng", 3);
-        return true;
-    }
-    return dvbjni::copyStringBytes(env, code.get(), rec->langCode, 3, "langCode") >= 0;
+    memcpy(rec->langCode, "eng", 3);
+    return dvbjni::readFrontend(env, settings, kStartClass, &rec->fe, kStartFields,
+                                NELEM(kStartFields), rec);
 }
 
 jint Scnm_Init(JNIEnv* env, jobject thiz) {
