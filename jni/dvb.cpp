@@ -110,29 +110,28 @@ void throwRuntime(JNIEnv* env, const char* message) {
 }
 
 // Stores `dvb` in thiz's mNativeContext and returns the object that was there before. The
-// Java object holds one strong reference, with itself as the reference ID.
-sp<DVB> setDVB(JNIEnv* env, jobject thiz, const sp<DVB>& dvb) {
+// Java object holds one strong reference, with itself as the reference ID. `*bound` tells
+// whether `dvb` got a context: only a 64-bit build can run out of them (4096 bound objects).
+sp<DVB> setDVB(JNIEnv* env, jobject thiz, const sp<DVB>& dvb, bool* bound) {
     __android_log_print(ANDROID_LOG_VERBOSE, kTag, "setDVB was called");
     pthread_mutex_lock(sLock.get());
     sp<DVB> old = dvbjni::contextObject(env->GetIntField(thiz, gFields.context));
     jint context = 0;
-    bool bound = true;
+    *bound = true;
     if (dvb != nullptr) {
         context = dvbjni::contextBind(dvb.get());
-        bound = context != 0;
-        if (bound) dvb->incStrong(thiz);
+        *bound = context != 0;
+        if (*bound) dvb->incStrong(thiz);
     }
     if (old != nullptr) {
         old->decStrong(thiz);
         dvbjni::contextRelease(old.get());
     }
-    DVB* stored = bound ? dvb.get() : nullptr;
+    DVB* stored = *bound ? dvb.get() : nullptr;
     __android_log_print(ANDROID_LOG_VERBOSE, kTag, "setDVB dvb.get() %p", stored);
     env->SetIntField(thiz, gFields.context, context);
     __android_log_print(ANDROID_LOG_VERBOSE, kTag, "setDVB dvb obj was set to context %p", stored);
     pthread_mutex_unlock(sLock.get());
-    // Only a 64-bit build can run out of contexts: it has room for 4095 bound objects.
-    if (!bound) jniThrowException(env, "java/lang/RuntimeException", "Out of memory");
     return old;
 }
 
@@ -164,12 +163,22 @@ void DVB_native_setup(JNIEnv* env, jobject thiz, jobject eventTarget) {
     }
     sp<JNIDVBListener> listener = new JNIDVBListener(env, thiz, eventTarget);
     dvb->setListener(listener);
-    setDVB(env, thiz, dvb);
+    bool bound;
+    setDVB(env, thiz, dvb, &bound);
+    if (!bound) {
+        // The refused object and its listener go first: their destructors call into the VM,
+        // which takes no call while an exception is pending.
+        dvb->setListener(nullptr);
+        listener.clear();
+        dvb.clear();
+        jniThrowException(env, "java/lang/RuntimeException", "Out of memory");
+    }
 }
 
 void DVB_native_release(JNIEnv* env, jobject thiz) {
     __android_log_print(ANDROID_LOG_VERBOSE, kTag, "android_dvb_DVB_release was called");
-    sp<DVB> old = setDVB(env, thiz, nullptr);
+    bool bound;
+    sp<DVB> old = setDVB(env, thiz, nullptr, &bound);
     if (old != nullptr) old->setListener(nullptr);
 }
 

@@ -55,14 +55,4 @@ TEST(Context, StaleValueDoesNotReachALaterObject) {
     EXPECT_EQ(std::adjacent_find(seen.begin(), seen.end()), seen.end());
 }
 
-TEST(Context, ManyObjectsBoundAtOnce) {
-    std::vector<std::pair<android::DVB*, jint>> bound;
-    for (uintptr_t i = 0; i < 1000; ++i) {
-        android::DVB* d = fake(20000 + i);
-        bound.emplace_back(d, dvbjni::contextBind(d));
-    }
-    for (auto& [d, ctx] : bound) EXPECT_EQ(dvbjni::contextObject(ctx), d);
-    for (auto& [d, ctx] : bound) dvbjni::contextRelease(d);
-}
-
 }  // namespace

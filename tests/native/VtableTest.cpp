@@ -16,8 +16,6 @@ long slotOf(F member) {
     uintptr_t raw[2];
     memcpy(raw, &member, sizeof raw);
 #if defined(__arm__) || defined(__aarch64__)
-    // The ARM variant keeps the virtual flag in the low bit of the adjustment and the plain
-    // byte offset in the pointer.
     EXPECT_EQ(raw[1] & 1u, 1u) << "not a virtual function";
     return static_cast<long>(raw[0] / sizeof(void*));
 #else
@@ -26,92 +24,33 @@ long slotOf(F member) {
 #endif
 }
 
-constexpr long kFirstOwnSlot = 6;  // RefBase's slots come first
+// The operations of `Class` in the device's order, one slot after another from slot 6.
+#define EXPECT_ORDER(Class, ...)                                \
+    do {                                                        \
+        using M = android::Class;                               \
+        long got[] = {__VA_ARGS__};                             \
+        for (size_t k = 0; k < sizeof got / sizeof got[0]; ++k) \
+            EXPECT_EQ(got[k], static_cast<long>(6 + k)) << k;   \
+    } while (0)
+#define S(op) slotOf(&M::op)
 
-#define EXPECT_ORDER(Class, op, k) EXPECT_EQ(slotOf(&android::Class::op), kFirstOwnSlot + (k)-1)
-
-TEST(Vtable, Scnm) {
-    EXPECT_ORDER(Scnm, Reserved1, 1);
-    EXPECT_ORDER(Scnm, Init, 2);
-    EXPECT_ORDER(Scnm, Open, 3);
-    EXPECT_ORDER(Scnm, Close, 4);
-    EXPECT_ORDER(Scnm, Start, 5);
-    EXPECT_ORDER(Scnm, Stop, 6);
-    EXPECT_ORDER(Scnm, GetStatus, 7);
-    EXPECT_ORDER(Scnm, CreateServiceList, 8);
-    EXPECT_ORDER(Scnm, Reserved9, 9);
-    EXPECT_ORDER(Scnm, CreateNetworkList, 10);
-    EXPECT_ORDER(Scnm, Reserved11, 11);
-    EXPECT_ORDER(Scnm, Dvb_SystemInit, 12);
-    EXPECT_ORDER(Scnm, Dvb_SystemUnInit, 13);
-}
-
-TEST(Vtable, Strm) {
-    EXPECT_ORDER(Strm, Init, 1);
-    EXPECT_ORDER(Strm, Open, 2);
-    EXPECT_ORDER(Strm, Close, 3);
-    EXPECT_ORDER(Strm, Start, 4);
-    EXPECT_ORDER(Strm, Stop, 5);
-    EXPECT_ORDER(Strm, GetSettings, 6);
-    EXPECT_ORDER(Strm, SetSettings, 7);
-    EXPECT_ORDER(Strm, GetStatus, 8);
-    EXPECT_ORDER(Strm, CreatStreamInfo, 9);
-    EXPECT_ORDER(Strm, GetAllEvent, 10);
-    EXPECT_ORDER(Strm, GetEvent, 11);
-    EXPECT_ORDER(Strm, GetTime, 12);
-    EXPECT_ORDER(Strm, CheckService, 13);
-    EXPECT_ORDER(Strm, EPG_GetEvent, 14);
-    EXPECT_ORDER(Strm, EpgMd_AddService, 15);
-    EXPECT_ORDER(Strm, EpgMd_ClearService, 16);
-}
-
-TEST(Vtable, Cfg) {
-    EXPECT_ORDER(Cfg, Reset, 1);
-    EXPECT_ORDER(Cfg, GotoPosition, 2);
-    EXPECT_ORDER(Cfg, StorePosition, 3);
-    EXPECT_ORDER(Cfg, Recalculate, 4);
-    EXPECT_ORDER(Cfg, Drive, 5);
-    EXPECT_ORDER(Cfg, Stop, 6);
-    EXPECT_ORDER(Cfg, SetLimit, 7);
-    EXPECT_ORDER(Cfg, DisableLimit, 8);
-    EXPECT_ORDER(Cfg, EnableLimit, 9);
-    EXPECT_ORDER(Cfg, GotoSatellite, 10);
-    EXPECT_ORDER(Cfg, TryTune, 11);
-    EXPECT_ORDER(Cfg, Tune, 12);
-    EXPECT_ORDER(Cfg, GetStatus, 13);
-    EXPECT_ORDER(Cfg, SetMuteAudio, 14);
-    EXPECT_ORDER(Cfg, SetAudioVolume, 15);
-    EXPECT_ORDER(Cfg, SetMuteVideo, 16);
-    EXPECT_ORDER(Cfg, SetVideoPos, 17);
-    EXPECT_ORDER(Cfg, CaGetStatus, 18);
-    EXPECT_ORDER(Cfg, CaStandby, 19);
-    EXPECT_ORDER(Cfg, GpioSet, 20);
-    EXPECT_ORDER(Cfg, Reserved21, 21);
-    EXPECT_ORDER(Cfg, BlindScanStart, 22);
-    EXPECT_ORDER(Cfg, BlindScanStop, 23);
-    EXPECT_ORDER(Cfg, TSDumpStart, 24);
-    EXPECT_ORDER(Cfg, TSDumpStop, 25);
-    EXPECT_ORDER(Cfg, GetVideoPos, 26);  // late in the order, not beside SetVideoPos
-    EXPECT_ORDER(Cfg, SetWakeup, 27);
-}
-
-TEST(Vtable, Subttl) {
-    EXPECT_ORDER(Subttl, Init, 1);
-    EXPECT_ORDER(Subttl, Start, 2);
-    EXPECT_ORDER(Subttl, Stop, 3);
-    EXPECT_ORDER(Subttl, GetData, 4);
-}
-
-TEST(Vtable, Teltxt) {
-    EXPECT_ORDER(Teltxt, Start, 1);
-    EXPECT_ORDER(Teltxt, Stop, 2);
-    EXPECT_ORDER(Teltxt, SetData, 3);
-    EXPECT_ORDER(Teltxt, GetData, 4);
-}
-
-TEST(Vtable, ListenerNotifyComesFirst) {
-    // DVBListener has RefBase as a virtual base: its own notify is its first slot.
-    EXPECT_EQ(slotOf(&android::DVBListener::notify), 0);
+TEST(Vtable, EveryModuleOperationKeepsItsPlace) {
+    EXPECT_ORDER(Scnm, S(Reserved1), S(Init), S(Open), S(Close), S(Start), S(Stop), S(GetStatus),
+                 S(CreateServiceList), S(Reserved9), S(CreateNetworkList), S(Reserved11),
+                 S(Dvb_SystemInit), S(Dvb_SystemUnInit));
+    EXPECT_ORDER(Strm, S(Init), S(Open), S(Close), S(Start), S(Stop), S(GetSettings),
+                 S(SetSettings), S(GetStatus), S(CreatStreamInfo), S(GetAllEvent), S(GetEvent),
+                 S(GetTime), S(CheckService), S(EPG_GetEvent), S(EpgMd_AddService),
+                 S(EpgMd_ClearService));
+    // Cfg::GetVideoPos stands late in the order, not beside Cfg::SetVideoPos.
+    EXPECT_ORDER(Cfg, S(Reset), S(GotoPosition), S(StorePosition), S(Recalculate), S(Drive),
+                 S(Stop), S(SetLimit), S(DisableLimit), S(EnableLimit), S(GotoSatellite),
+                 S(TryTune), S(Tune), S(GetStatus), S(SetMuteAudio), S(SetAudioVolume),
+                 S(SetMuteVideo), S(SetVideoPos), S(CaGetStatus), S(CaStandby), S(GpioSet),
+                 S(Reserved21), S(BlindScanStart), S(BlindScanStop), S(TSDumpStart), S(TSDumpStop),
+                 S(GetVideoPos), S(SetWakeup));
+    EXPECT_ORDER(Subttl, S(Init), S(Start), S(Stop), S(GetData));
+    EXPECT_ORDER(Teltxt, S(Start), S(Stop), S(SetData), S(GetData));
 }
 
 // RefBase's hooks are protected: a subclass may name them.
@@ -120,9 +59,11 @@ struct Probe : android::RefBase {
     static long last() { return slotOf(&Probe::onLastWeakRef); }
 };
 
-TEST(Vtable, RefBaseHasTheSixSlotsThatModulesFollow) {
+TEST(Vtable, RefBaseAndListenerSlots) {
     EXPECT_EQ(Probe::first(), 2);
     EXPECT_EQ(Probe::last(), 5);
+    // DVBListener has RefBase as a virtual base: its own notify is its first slot.
+    EXPECT_EQ(slotOf(&android::DVBListener::notify), 0);
 }
 
 }  // namespace

@@ -115,11 +115,6 @@ jlongArray Spy_args(JNIEnv* env, jclass, jint i) {
     return a;
 }
 
-jint Spy_recordCount(JNIEnv* env, jclass, jint i) {
-    dvbspy::Call c;
-    return callAt(env, i, &c) ? static_cast<jint>(c.records.size()) : -1;
-}
-
 jbyteArray Spy_record(JNIEnv* env, jclass, jint i, jint r) {
     dvbspy::Call c;
     if (!callAt(env, i, &c)) return nullptr;
@@ -315,7 +310,6 @@ const JNINativeMethod gMethods[] = {
         MAKE_JNI_NATIVE_METHOD("callCount", "()I", Spy_callCount),
         MAKE_JNI_NATIVE_METHOD("op", "(I)Ljava/lang/String;", Spy_op),
         MAKE_JNI_NATIVE_METHOD("args", "(I)[J", Spy_args),
-        MAKE_JNI_NATIVE_METHOD("recordCount", "(I)I", Spy_recordCount),
         MAKE_JNI_NATIVE_METHOD("record", "(II)[B", Spy_record),
         MAKE_JNI_NATIVE_METHOD("owner", "(I)J", Spy_owner),
         MAKE_JNI_NATIVE_METHOD("setResult", "(Ljava/lang/String;I)V", Spy_setResult),

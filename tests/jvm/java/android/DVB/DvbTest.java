@@ -1,27 +1,21 @@
 package android.DVB;
 
-import static org.junit.jupiter.api.Assertions.assertEquals;
-import static org.junit.jupiter.api.Assertions.assertFalse;
-import static org.junit.jupiter.api.Assertions.assertNotEquals;
-import static org.junit.jupiter.api.Assertions.assertNull;
-import static org.junit.jupiter.api.Assertions.assertSame;
-import static org.junit.jupiter.api.Assertions.assertTrue;
+import static org.junit.jupiter.api.Assertions.*;
+import static org.junit.jupiter.api.Assumptions.assumeTrue;
 
 import java.lang.ref.WeakReference;
-import java.lang.reflect.InvocationTargetException;
-import java.lang.reflect.Method;
-import java.util.ArrayList;
-import java.util.Arrays;
-import java.util.Collections;
-import java.util.List;
+import java.util.*;
+import java.util.concurrent.atomic.AtomicLong;
 import org.junit.jupiter.api.Test;
 
-/** Library entry, binding of the DVB object, the listener and its events. */
+/** Library entry, binding of the DVB object, its references, the listener and its events. */
 class DvbTest extends SpyTestBase {
 
-    /** %p as this C library prints it. */
-    static String pointer(long address) {
-        return address == 0 ? "(nil)" : String.format("0x%x", address);
+    /** The lines of one DVB method: its own, then setDVB's with `address` (0: none) as %p. */
+    static List<String> lines(String method, long address) {
+        String p = address == 0 ? "(nil)" : String.format("0x%x", address);
+        return List.of("2 DVB " + method + " was called", "2 DVB setDVB was called",
+                "2 DVB setDVB dvb.get() " + p, "2 DVB setDVB dvb obj was set to context " + p);
     }
 
     static long onlyDvb() {
@@ -30,187 +24,173 @@ class DvbTest extends SpyTestBase {
         return live[0];
     }
 
-    static void invoke(DVB target, String name, Object... args) throws Exception {
-        Class<?>[] types = new Class<?>[args.length];
-        Arrays.fill(types, Object.class);
-        Method m = DVB.class.getDeclaredMethod(name, types);
-        m.setAccessible(true);
-        try {
-            m.invoke(target, args);
-        } catch (InvocationTargetException e) {
-            throw (Exception) e.getCause();
+    /** Global references made, and made minus deleted, since the last look. */
+    static List<Integer> refs() {
+        int made = 0;
+        int balance = 0;
+        for (String e : Spy.takeGlobalRefEvents()) {
+            made += e.startsWith("new") ? 1 : 0;
+            balance += e.startsWith("new") ? 1 : -1;
         }
+        return List.of(made, balance);
     }
 
     @Test
     void loadRegistersEveryClassAndReturnsVersion14() {
         assertEquals(0x00010004, Spy.callOnLoad());
-        assertLogs("2 DVB register_android_dvb_DVB was called",
-                "2 CFG register_android_dvb_Cfg was called");
+        assertEquals(List.of("2 DVB register_android_dvb_DVB was called",
+                "2 CFG register_android_dvb_Cfg was called"), List.of(Spy.takeLogs()));
     }
 
     @Test
-    void setupBindsNewObjectWithOneReferenceAndListener() {
-        long address = onlyDvb();
-        assertNotEquals(0, dvb.nativeContext());
-        if (Spy.pointerSize() == 4) assertEquals(address, dvb.nativeContext() & 0xFFFFFFFFL);
-        assertEquals(1, Spy.strongCount(address), "the Java object's reference only");
-        assertTrue(Spy.hasListener(address));
-        assertEquals(1, Spy.liveListenerCount());
-    }
-
-    @Test
-    void setupWritesItsLogLines() {
+    void bindingLifeCycleWithItsLinesAndReferences() throws Throwable {
         dvb.release();
-        Spy.takeLogs();
+        Spy.trackGlobalRefs();
+        Spy.takeGlobalRefEvents();
         dvb = new DVB();
-        long address = onlyDvb();
-        assertLogs("2 DVB android_dvb_DVB_native_setup was called",
-                "2 DVB setDVB was called",
-                "2 DVB setDVB dvb.get() " + pointer(address),
-                "2 DVB setDVB dvb obj was set to context " + pointer(address));
-    }
-
-    @Test
-    void releaseDestroysObjectAndListenerAndSecondReleaseOnlyLogs() {
-        dvb.release();
-        assertEquals(0, dvb.nativeContext());
-        assertEquals(0, Spy.liveDvbCount());
-        assertEquals(0, Spy.liveListenerCount());
-        assertLogs("2 DVB android_dvb_DVB_release was called",
-                "2 DVB setDVB was called",
-                "2 DVB setDVB dvb.get() (nil)",
-                "2 DVB setDVB dvb obj was set to context (nil)");
-        dvb.release();
-        assertLogs("2 DVB android_dvb_DVB_release was called",
-                "2 DVB setDVB was called",
-                "2 DVB setDVB dvb.get() (nil)",
-                "2 DVB setDVB dvb obj was set to context (nil)");
-        dvb = null;
-    }
-
-    @Test
-    void finalizeLogsThenReleases() {
-        dvb.finalize();
-        assertEquals(0, Spy.liveDvbCount());
-        assertLogs("2 DVB android_dvb_DVB_native_finalize was called",
-                "2 DVB android_dvb_DVB_release was called",
-                "2 DVB setDVB was called",
-                "2 DVB setDVB dvb.get() (nil)",
-                "2 DVB setDVB dvb obj was set to context (nil)");
-        dvb = null;
-    }
-
-    @Test
-    void secondSetupReplacesAndDropsFirstObject() throws Exception {
+        assertEquals(List.of("new class", "new object"), List.of(Spy.takeGlobalRefEvents()));
         long first = onlyDvb();
+        if (Spy.pointerSize() == 4) assertEquals(first, dvb.nativeContext() & 0xFFFFFFFFL);
+        assertEquals(1, Spy.strongCount(first), "the Java object's reference only");
+        assertTrue(Spy.hasListener(first));
         int firstContext = dvb.nativeContext();
-        invoke(dvb, "native_setup", new WeakReference<>(dvb));
+        Spy.takeLogs();
+        call(dvb, "native_setup", new WeakReference<>(dvb)); // binds anew, drops the first
         long second = onlyDvb();
         assertNotEquals(first, second);
         assertNotEquals(firstContext, dvb.nativeContext());
         assertEquals(1, Spy.strongCount(second));
         assertEquals(1, Spy.liveListenerCount(), "the first listener went with its object");
+        assertEquals(lines("android_dvb_DVB_native_setup", second), List.of(Spy.takeLogs()));
+        Spy.takeGlobalRefEvents();
+        dvb.release();
+        assertEquals(List.of("delete object", "delete class"), List.of(Spy.takeGlobalRefEvents()));
+        assertEquals(0, dvb.nativeContext());
+        assertEquals(0, Spy.liveDvbCount() + Spy.liveListenerCount());
+        assertEquals(lines("android_dvb_DVB_release", 0), List.of(Spy.takeLogs()));
+        dvb.release(); // an unbound object only logs
+        assertEquals(lines("android_dvb_DVB_release", 0), List.of(Spy.takeLogs()));
+        dvb.finalize();
+        List<String> finalize = new ArrayList<>(List.of("2 DVB android_dvb_DVB_native_finalize was called"));
+        finalize.addAll(lines("android_dvb_DVB_release", 0));
+        assertEquals(finalize, List.of(Spy.takeLogs()));
+        dvb = null;
     }
 
     @Test
-    void oneEventArrivesAsOneCallWithNullObject() throws Exception {
-        List<Object[]> got = Collections.synchronizedList(new ArrayList<>());
-        dvb.setOnEventListener((d, msg, e1, e2, obj) ->
-                got.add(new Object[] {d, msg, e1, e2, obj, Thread.currentThread()}));
-        Spy.raise(1, 2, 3, 1, 1);
-        assertEquals(1, got.size());
-        Object[] e = got.get(0);
-        assertSame(dvb, e[0]);
-        assertEquals(Arrays.asList(1, 2, 3), Arrays.asList(e[1], e[2], e[3]));
-        assertNull(e[4]);
-        assertNotEquals(Thread.currentThread(), e[5], "delivered on the service's thread");
-    }
-
-    @Test
-    void eventsFromSeveralServiceThreadsAreNeitherLostNorDoubled() {
-        int[] count = new int[1];
-        dvb.setOnEventListener((d, msg, e1, e2, obj) -> {
-            synchronized (count) {
-                count[0]++;
-            }
-        });
-        Spy.raise(7, -1, Integer.MIN_VALUE, 250, 4);
-        assertEquals(1000, count[0]);
-    }
-
-    @Test
-    void throwingListenerLosesNoLaterEvent() {
+    void eventsAndCallsReachEachObjectsOwnTarget() {
+        DVB other = new DVB();
         List<Throwable> uncaught = Collections.synchronizedList(new ArrayList<>());
         Thread.UncaughtExceptionHandler previous = Thread.getDefaultUncaughtExceptionHandler();
         Thread.setDefaultUncaughtExceptionHandler((t, e) -> uncaught.add(e));
         try {
-            int[] count = new int[1];
-            dvb.setOnEventListener((d, msg, e1, e2, obj) -> {
-                count[0]++;
-                throw new IllegalStateException("listener " + e1);
-            });
-            Spy.raise(5, 9, 0, 3, 1);
-            assertEquals(3, count[0]);
+            List<Object[]> got = Collections.synchronizedList(new ArrayList<>());
+            DVB.OnEventListener l = (d, msg, e1, e2, obj) -> {
+                got.add(new Object[] {d, msg, e1, e2, obj, Thread.currentThread()});
+                if (d == other) throw new IllegalStateException("listener " + e1);
+            };
+            dvb.setOnEventListener(l);
+            other.setOnEventListener(l);
+            Spy.raise(1, 2, 3, 3, 1);
+            assertEquals(6, got.size(), "a throwing listener loses no later event");
+            for (Object[] e : got) {
+                assertEquals(List.of(1, 2, 3), Arrays.asList(e[1], e[2], e[3]));
+                assertNull(e[4]);
+                assertNotEquals(Thread.currentThread(), e[5], "delivered on the service's thread");
+            }
+            assertEquals(3, got.stream().filter(e -> e[0] == dvb).count());
             assertEquals(3, uncaught.size());
-            assertEquals("listener 9", uncaught.get(0).getMessage());
+            assertEquals("listener 2", uncaught.get(0).getMessage());
+
+            other.getCfg().Cfg_Stop(1);
+            dvb.getCfg().Cfg_Stop(2);
+            long[] live = Spy.liveDvbs();
+            assertEquals(List.of(live[1], live[0]), List.of(Spy.owner(0), Spy.owner(1)));
         } finally {
             Thread.setDefaultUncaughtExceptionHandler(previous);
-        }
-    }
-
-    @Test
-    void eventsReachEachObjectsOwnTarget() {
-        DVB other = new DVB();
-        try {
-            List<DVB> got = Collections.synchronizedList(new ArrayList<>());
-            dvb.setOnEventListener((d, msg, e1, e2, obj) -> got.add(d));
-            other.setOnEventListener((d, msg, e1, e2, obj) -> got.add(d));
-            Spy.raise(1, 0, 0, 1, 1);
-            assertEquals(2, got.size());
-            assertTrue(got.contains(dvb) && got.contains(other));
-        } finally {
             other.release();
         }
     }
 
+    /**
+     * A 64-bit build keeps contexts in a table of 4096 bound objects: all of them bind, the
+     * next native_setup raises RuntimeException("Out of memory") and leaves nothing behind.
+     */
     @Test
-    void listenerHoldsTwoGlobalRefsAndDeletesObjectBeforeClass() {
+    @SuppressWarnings({"deprecation", "removal"})
+    void theContextTableHoldsExactly4096BoundObjects() {
+        assumeTrue(Spy.pointerSize() == 8, "a 32-bit context is the address itself");
+        dvb.release();
+        dvb = null;
+        for (int i = 0; i < 3 && Spy.liveDvbCount() > 0; i++) {
+            System.gc();
+            System.runFinalization();
+        }
+        assertEquals(0, Spy.liveDvbCount(), "objects of earlier tests still bound");
+        Spy.trackGlobalRefs();
+        Spy.takeGlobalRefEvents();
+        List<DVB> bound = new ArrayList<>();
+        try {
+            RuntimeException e = assertThrows(RuntimeException.class, () -> {
+                while (bound.size() <= 4096) bound.add(new DVB());
+            });
+            assertEquals(RuntimeException.class, e.getClass());
+            assertEquals("Out of memory", e.getMessage());
+            assertEquals(4096, bound.size());
+            assertEquals(4096, Spy.liveDvbCount(), "the refused object is gone");
+            assertEquals(4096, Spy.liveListenerCount(), "and its listener with it");
+            assertEquals(List.of(2 * 4097, 2 * 4096), refs(), "the refused listener's references too");
+        } finally {
+            bound.forEach(DVB::release);
+            Spy.takeLogs();
+        }
+        assertEquals(0, Spy.liveDvbCount());
+        dvb = new DVB(); // room again
+    }
+
+    /**
+     * Java threads calling module methods while the service raises events from native threads
+     * and other DVB objects are bound and released: every event reaches the long-lived object
+     * once, and afterwards every object, listener and global reference is gone.
+     */
+    @Test
+    void concurrentCallsEventsAndBindings() throws Exception {
         dvb.release();
         Spy.trackGlobalRefs();
         Spy.takeGlobalRefEvents();
         dvb = new DVB();
-        assertEquals(Arrays.asList("new class", "new object"), Arrays.asList(Spy.takeGlobalRefEvents()));
-        dvb.release();
-        assertEquals(Arrays.asList("delete object", "delete class"),
-                Arrays.asList(Spy.takeGlobalRefEvents()));
-        dvb = null;
-    }
-
-    @Test
-    void nothingLeaksOverManyBindings() {
-        dvb.release();
-        Spy.trackGlobalRefs();
-        Spy.takeGlobalRefEvents();
-        for (int i = 0; i < 200; i++) {
-            DVB d = new DVB();
-            if (i % 2 == 0) Spy.raise(1, i, 0, 1, 1);
-            d.release();
+        AtomicLong received = new AtomicLong();
+        dvb.setOnEventListener((d, msg, e1, e2, obj) -> received.addAndGet(msg == 42 ? 1 : 0));
+        List<Throwable> failures = Collections.synchronizedList(new ArrayList<>());
+        List<Thread> threads = new ArrayList<>();
+        for (int t = 0; t < 3; t++) {
+            threads.add(new Thread(() -> {
+                Teltxt.TELTXT_NavPages nav = new Teltxt.TELTXT_NavPages();
+                for (int i = 0; i < 2000; i++) {
+                    assertEquals(0, dvb.getCfg().Cfg_GetStatus(i, new Cfg.ANT_Status()));
+                    assertEquals(0, dvb.getTeltxt().Teltxt_GetData(i, 0, 64, new byte[64]));
+                    dvb.getTeltxt().Teltxt_SetData(i, 1, 2, nav);
+                }
+            }));
         }
-        assertEquals(0, Spy.liveDvbCount());
-        assertEquals(0, Spy.liveListenerCount());
-        int balance = 0;
-        for (String e : Spy.takeGlobalRefEvents()) balance += e.startsWith("new") ? 1 : -1;
-        assertEquals(0, balance, "global references made minus deleted");
-        dvb = null;
-    }
-
-    @Test
-    void releasedObjectKeepsNoContext() {
-        int context = dvb.nativeContext();
+        threads.add(new Thread(() -> {
+            Spy.trackGlobalRefs();
+            for (int i = 0; i < 300; i++) {
+                DVB other = new DVB();
+                other.setOnEventListener((d, msg, e1, e2, obj) -> { });
+                other.getCfg().Cfg_Stop(i);
+                other.release();
+            }
+        }));
+        threads.add(new Thread(() -> Spy.raise(42, 0, 0, 500, 4)));
+        threads.forEach(t -> t.setUncaughtExceptionHandler((th, e) -> failures.add(e)));
+        threads.forEach(Thread::start);
+        for (Thread t : threads) t.join();
+        assertEquals(List.of(), failures);
+        assertEquals(2000, received.get(), "events to the bound object");
         dvb.release();
-        assertEquals(0, dvb.nativeContext());
-        assertFalse(context == 0);
         dvb = null;
+        assertEquals(0, Spy.liveDvbCount() + Spy.liveListenerCount(), "objects or listeners left");
+        assertEquals(List.of(2 * 301, 0), refs(), "two global references per bound object, all gone");
     }
 }

@@ -13,7 +13,6 @@ final class Spy {
     static native int callCount();
     static native String op(int call);
     static native long[] args(int call);
-    static native int recordCount(int call);
     static native byte[] record(int call, int record);
     static native long owner(int call);
     static native void setResult(String op, int result);

@@ -1,0 +1,191 @@
+package android.DVB;
+
+import static org.junit.jupiter.api.Assertions.*;
+
+import java.io.File;
+import java.time.Duration;
+import java.util.*;
+import java.util.concurrent.atomic.AtomicInteger;
+import org.junit.jupiter.api.*;
+import org.junit.jupiter.params.ParameterizedTest;
+import org.junit.jupiter.params.provider.*;
+
+/** The methods whose arguments are not records of one layout, and the rules of their own. */
+class BehaviourTest extends SpyTestBase {
+    static final File EPG_DB = new File(System.getProperty("dvb.epgdb", "/nonexistent/epg.db"));
+    static final Duration NO_HANG = Duration.ofMinutes(2); // reached only by a broken wait
+
+    @BeforeEach
+    @AfterEach
+    void removeDatabase() {
+        EPG_DB.delete();
+    }
+
+    static String ascii(int length) {
+        StringBuilder s = new StringBuilder();
+        for (int i = 0; i < length; i++) s.append((char) ('a' + i % 26));
+        return s.toString();
+    }
+
+    @ParameterizedTest
+    @ValueSource(ints = {0, 1, 255, 256, 300})
+    void aDumpPathIsCutAfter255BytesAndZeroEnded(int length) {
+        Spy.setResult("Cfg::TSDumpStart", -1);
+        assertEquals(0, dvb.getCfg().Cfg_TSDumpStart(1, 2, 3, ascii(length)));
+        int call = onlyCall("Cfg::TSDumpStart");
+        assertArrayEquals(new long[] {1, 2, 3, 0}, Spy.args(call));
+        byte[] want = new byte[256];
+        System.arraycopy(Layout.utf8(ascii(length)), 0, want, 0, Math.min(length, 255));
+        assertArrayEquals(want, Spy.record(call, 0));
+    }
+
+    @Test
+    void caStatusTakesSourceFromTheFirstAddress() {
+        Spy.setOut("Cfg::CaGetStatus", 1, 0, le32(3));
+        Spy.setOut("Cfg::CaGetStatus", 2, 0, le32(-7));
+        Spy.setResult("Cfg::CaGetStatus", -1);
+        Cfg.CA_Status s = new Cfg.CA_Status();
+        assertEquals(0, dvb.getCfg().Cfg_CaGetStatus(-4, s));
+        assertEquals(Arrays.asList(3, -7), Arrays.asList(s.source, s.lastCwSet));
+        int call = onlyCall("Cfg::CaGetStatus");
+        assertArrayEquals(new long[] {-4, 0, 0}, Spy.args(call));
+        assertArrayEquals(le32(0), Spy.record(call, 0), "zeroed first");
+        assertArrayEquals(le32(0), Spy.record(call, 1), "zeroed first");
+    }
+
+    @Test
+    void navigationValuesAreAllWrittenWhateverTheModuleSays() {
+        Spy.setOut("Teltxt::SetData", 3, 0, le32(100));
+        Spy.setOut("Teltxt::SetData", 5, 0, le32(0x7FFFFFFF));
+        Spy.setOut("Teltxt::SetData", 6, 0, le32(-190));
+        Spy.setResult("Teltxt::SetData", -9);
+        Teltxt.TELTXT_NavPages nav = new Teltxt.TELTXT_NavPages();
+        nav.prev10 = 77;
+        assertEquals(-9, dvb.getTeltxt().Teltxt_SetData(HANDLE, -3, 0x10000, nav));
+        assertEquals(Arrays.asList(100, 0, 0x7FFFFFFF, -190),
+                Arrays.asList(nav.prev100, nav.prev10, nav.next10, nav.next100));
+        int call = onlyCall("Teltxt::SetData");
+        assertArrayEquals(new long[] {LOW, -3, 0x10000, 0, 0, 0, 0}, Spy.args(call));
+        for (int r = 0; r < 4; r++) assertArrayEquals(le32(0), Spy.record(call, r), "value " + r);
+    }
+
+    /** The byte the spy's decoder holds at `position` of its data. */
+    static byte teletextByte(long position) {
+        return (byte) ((position * 31 + 7) ^ (position >> 8));
+    }
+
+    /** Count, then the pieces the module must be asked for: offset, size, offset, size... */
+    @ParameterizedTest
+    @CsvSource({"1, 0 1", "524288, 0 524288", "524289, 0 524288 524288 1",
+        "1200000, 0 524288 524288 524288 1048576 151424"})
+    void teletextDataComesInPiecesOfHalfAMegabyte(int count, String pieces) {
+        Spy.setResult("Teltxt::GetData", -1);
+        byte[] data = new byte[count + 10];
+        assertEquals(0, dvb.getTeltxt().Teltxt_GetData(HANDLE, 10, count, data));
+        String[] p = pieces.split(" ");
+        assertEquals(p.length / 2, Spy.callCount());
+        for (int i = 0; i < p.length / 2; i++) {
+            assertEquals("Teltxt::GetData", Spy.op(i));
+            assertArrayEquals(new long[] {LOW, Long.parseLong(p[2 * i]), Long.parseLong(p[2 * i + 1]), 0},
+                    Spy.args(i), "piece " + i);
+        }
+        for (int i = 0; i < data.length; i++) {
+            byte want = i < 10 ? 0 : teletextByte(i - 10);
+            if (data[i] != want) assertEquals(want, data[i], "element " + i);
+        }
+    }
+
+    @Test
+    void teletextDataOfNothingOrOfANegativeCountCallsNothing() {
+        byte[] data = bytes(1, 2, 3);
+        assertEquals(0, dvb.getTeltxt().Teltxt_GetData(5, 3, 0, data));
+        assertThrows(ArrayIndexOutOfBoundsException.class,
+                () -> dvb.getTeltxt().Teltxt_GetData(5, 4, 0, data));
+        IllegalArgumentException e = assertThrows(IllegalArgumentException.class,
+                () -> dvb.getTeltxt().Teltxt_GetData(5, 0, -5, data));
+        assertEquals("count -5 is negative", e.getMessage());
+        assertArrayEquals(bytes(1, 2, 3), data);
+        assertEquals(0, Spy.callCount());
+    }
+
+    @ParameterizedTest
+    @ValueSource(ints = {5, -1, 8})
+    void teletextDataOutsideTheArrayLeavesTheBoundsErrorAfterFetching(int start) {
+        byte[] data = new byte[8];
+        Arrays.fill(data, (byte) 0x33);
+        assertThrows(ArrayIndexOutOfBoundsException.class,
+                () -> dvb.getTeltxt().Teltxt_GetData(5, start, 10, data));
+        assertArrayEquals(new long[] {5, 0, 10, 0}, Spy.args(onlyCall("Teltxt::GetData")));
+        for (byte b : data) assertEquals(0x33, b);
+    }
+
+    @Test
+    void streamTimeIsZeroExtended() {
+        Spy.setOut("Strm::GetTime", 1, 0, le32(-1));
+        Spy.setResult("Strm::GetTime", -1);
+        assertEquals(4294967295L, dvb.getStrm().Strm_GetTime(HANDLE, -1));
+        int call = onlyCall("Strm::GetTime");
+        assertArrayEquals(new long[] {LOW, 0}, Spy.args(call));
+        assertArrayEquals(le32(0), Spy.record(call, 0));
+    }
+
+    @ParameterizedTest
+    @CsvSource({"128, 128", "300, 300", "64, 128"})
+    void aStreamPathThatDoesNotFitIsRefused(int chars, int bytes) {
+        Strm.STRM_OpenSettings o = new Strm.STRM_OpenSettings();
+        o.szPath = chars == bytes ? ascii(chars) : new String(new char[chars]).replace('\0', '\u00e9');
+        IllegalArgumentException e = assertThrows(IllegalArgumentException.class,
+                () -> dvb.getStrm().Strm_Open(o));
+        assertEquals("STRM_OpenSettings.szPath is " + bytes + " bytes; at most 127 fit",
+                e.getMessage());
+        assertEquals(0, Spy.callCount());
+    }
+
+    /** Text a module leaves without a zero byte ends at its field; bad bytes become U+FFFD. */
+    @Test
+    void moduleTextEndsAtItsFieldAndBadBytesAreReplaced() {
+        byte[] info = new byte[1728];
+        le(info).putInt(68, 2);
+        Arrays.fill(info, 72 + 4, 72 + 12, (byte) 'L');
+        byte[] bad = {'a', (byte) 0xFF, 'b', (byte) 0xC0, (byte) 0x80, (byte) 0xE2, (byte) 0x82, 0};
+        System.arraycopy(bad, 0, info, 72 + 46 + 13, bad.length);
+        Spy.setOut("Strm::CreatStreamInfo", 1, 0, info);
+        dvb.getStrm().Strm_CreatStreamInfo(0, new Strm.STRM_StreamInfo());
+        Strm.AudioContent a = new Strm.AudioContent();
+        dvb.getStrm().Strm_GetAudioStreamInfo(0, a);
+        assertEquals(Arrays.asList("LLLL", "LLLL"), Arrays.asList(a.langCode0, a.langCode1));
+        dvb.getStrm().Strm_GetAudioStreamInfo(1, a);
+        assertEquals("a\uFFFDb\u0000\uFFFD\uFFFD", a.streamName);
+    }
+
+    static Scnm.DVB_Config config() {
+        Scnm.DVB_Config c = new Scnm.DVB_Config();
+        c.displayMode = 1080;
+        c.sdkMode = -2;
+        return c;
+    }
+
+    @Test
+    void systemStartUpWaitsForTheEventDatabaseAndShutDownNever() throws Exception {
+        Scnm s = dvb.getScnm();
+        Spy.setResult("Scnm::Dvb_SystemUnInit", -3);
+        assertEquals(0, (int) assertTimeoutPreemptively(NO_HANG, () -> s.Dvb_SystemUnInit(config())));
+        assertFalse(EPG_DB.exists());
+        AtomicInteger result = new AtomicInteger(99);
+        Spy.setResult("Scnm::Dvb_SystemInit", -3);
+        Thread caller = new Thread(() -> result.set(s.Dvb_SystemInit(config())));
+        caller.start();
+        while (Spy.callCount() < 2 && caller.isAlive()) Thread.sleep(5);
+        Thread.sleep(600); // time enough for a call that does not wait to return
+        assertTrue(caller.isAlive(), "returned before the database existed");
+        assertTrue(EPG_DB.createNewFile());
+        caller.join(NO_HANG.toMillis());
+        assertFalse(caller.isAlive(), "still waiting although the database exists");
+        assertEquals(0, result.get());
+        assertEquals(0, (int) assertTimeoutPreemptively(NO_HANG, () -> s.Dvb_SystemInit(config())));
+        assertEquals(Arrays.asList("Scnm::Dvb_SystemUnInit", "Scnm::Dvb_SystemInit",
+                "Scnm::Dvb_SystemInit"), ops());
+        for (int call = 0; call < 3; call++) assertArrayEquals(le32(1080, -2), Spy.record(call, 0));
+        assertEquals(Arrays.asList(GETTER, GETTER, GETTER), logs());
+    }
+}

@@ -1,0 +1,158 @@
+package android.DVB;
+
+import static org.junit.jupiter.api.Assertions.*;
+import static org.junit.jupiter.api.Assumptions.assumeTrue;
+
+import java.lang.reflect.*;
+import java.time.Duration;
+import java.util.*;
+import org.junit.jupiter.api.Test;
+import org.junit.jupiter.params.ParameterizedTest;
+import org.junit.jupiter.params.provider.*;
+
+/**
+ * The failure paths that every module method shares, swept over each class's declared natives:
+ * no DVB object, no module, null argument objects, null strings in a record. None of them
+ * reaches a module, and each writes exactly its class's lines.
+ */
+class FailureTest extends SpyTestBase {
+    static final Duration NO_HANG = Duration.ofSeconds(60); // a start-up wait that should not be
+
+    static List<Method> natives(Class<?> cls) {
+        List<Method> out = new ArrayList<>();
+        for (Method m : cls.getDeclaredMethods()) {
+            if (Modifier.isNative(m.getModifiers())) out.add(m);
+        }
+        out.sort(Comparator.comparing(Method::getName));
+        return out;
+    }
+
+    /** Arguments for `m`: zeros, and fresh objects whose strings are set; null at `nullAt`. */
+    static Object[] args(Method m, int nullAt) throws ReflectiveOperationException {
+        Class<?>[] types = m.getParameterTypes();
+        Object[] values = new Object[types.length];
+        for (int i = 0; i < types.length; i++) {
+            Class<?> t = types[i];
+            if (i == nullAt) continue;
+            if (t == int.class) values[i] = 0;
+            else if (t == long.class) values[i] = 0L;
+            else if (t == boolean.class) values[i] = false;
+            else if (t == String.class) values[i] = "x";
+            else if (t == byte[].class) values[i] = new byte[8];
+            else values[i] = withStrings(t.getDeclaredConstructor().newInstance());
+        }
+        return values;
+    }
+
+    static Object withStrings(Object o) throws IllegalAccessException {
+        for (Field f : o.getClass().getFields()) {
+            if (f.getType() == String.class) f.set(o, "abc");
+        }
+        return o;
+    }
+
+    /** The lines a call of `method` writes when its module is out of reach. */
+    static List<String> noModuleLines(String cls, String method, boolean bound) {
+        List<String> lines = new ArrayList<>();
+        if (cls.equals("Scnm")) {
+            if (method.equals("Scnm_GetNetworkList")) lines.add(NET_BEGIN);
+            lines.add(GETTER);
+            if (!bound) lines.add("2 SCNM could not get the dvb obj from context");
+            lines.add(method.matches("Scnm_(Init|Open|Close|Start|Stop|GetStatus)")
+                    ? "2 SCNM android_dvb_Scnm_Init,could not get the dvb obj from context"
+                    : "2 SCNM android_dvb_Tuner_StartAVPlay,could not get the dvb obj from context");
+        }
+        if (method.equals("Cfg_Reset")) lines.add("2 CFG android_dvb_Cfg_Reset was called");
+        if (cls.equals("Cfg") && !bound) lines.add("3 CFG could not get the dvb obj from context");
+        return lines;
+    }
+
+    static void assertRaises(Class<? extends Throwable> type, String message, Object target,
+            Method m, Object[] values) {
+        Throwable e = assertThrows(type, () -> assertTimeoutPreemptively(NO_HANG,
+                () -> call(target, m.getName(), values)), m.getName());
+        assertEquals(message, e.getMessage(), m.getName());
+    }
+
+    @ParameterizedTest
+    @CsvSource({"Scnm, 12", "Strm, 23", "Cfg, 27", "Subttl, 11", "Teltxt, 4"})
+    void everyNativeIsRegisteredAndFailsWithoutItsModule(String name, int count)
+            throws Throwable {
+        Class<?> cls = Class.forName("android.DVB." + name);
+        assertEquals(count, natives(cls).size());
+        Object unbound = cls.getDeclaredConstructor(int.class).newInstance(0);
+        for (Method m : natives(cls)) {
+            assertRaises(IllegalStateException.class, null, unbound, m, args(m, -1));
+            assertEquals(noModuleLines(name, m.getName(), false), logs(), m.getName());
+        }
+        dvb.release();
+        Spy.omit(new String[] {name});
+        dvb = new DVB();
+        Spy.takeLogs();
+        Object without = module(dvb, name);
+        for (Method m : natives(cls)) {
+            assertRaises(IllegalStateException.class, null, without, m, args(m, -1));
+            assertEquals(noModuleLines(name, m.getName(), true), logs(), m.getName());
+        }
+        assertEquals(0, Spy.callCount());
+    }
+
+    @ParameterizedTest
+    @ValueSource(strings = {"Scnm", "Strm", "Cfg", "Subttl", "Teltxt"})
+    void aNullArgumentIsNamedAndReachesNoModule(String name) throws Throwable {
+        Class<?> cls = Class.forName("android.DVB." + name);
+        Object target = module(dvb, name);
+        for (Method m : natives(cls)) {
+            Class<?>[] types = m.getParameterTypes();
+            for (int i = 0; i < types.length; i++) {
+                if (types[i].isPrimitive()) continue;
+                String what = types[i] == String.class ? "path"
+                        : types[i] == byte[].class ? "data" : types[i].getSimpleName();
+                assertRaises(NullPointerException.class, what + " is null", target, m, args(m, i));
+                List<String> lines = new ArrayList<>();
+                if (m.getName().equals("Scnm_GetNetworkList")) lines.add(NET_BEGIN);
+                if (name.equals("Scnm")) lines.add(GETTER);
+                assertEquals(lines, logs(), m.getName());
+            }
+        }
+        assertEquals(0, Spy.callCount());
+    }
+
+    @Test
+    void aNullStringInARecordIsNamedWithItsField() throws Throwable {
+        for (ContractTest.Row r : ContractTest.ROWS) {
+            for (int i = 0; i < r.args().length; i++) {
+                if (!(r.args()[i] instanceof ContractTest.Rec rec) || !rec.in()) continue;
+                for (Layout.Slot s : rec.layout().slots) {
+                    if (s.field() == null || s.field().getType() != String.class
+                            || s.kind().equals("eng")) {
+                        continue;
+                    }
+                    Object[] values = r.args().clone();
+                    for (int k = 0; k < values.length; k++) {
+                        if (values[k] instanceof ContractTest.Rec x) values[k] = x.layout().fill(x.layout().create(), 1);
+                    }
+                    s.field().set(values[i], null);
+                    Throwable e = assertThrows(NullPointerException.class,
+                            () -> call(module(dvb, r.cls()), r.method(), values), r.method());
+                    assertEquals(rec.layout().cls.getSimpleName() + "." + s.field().getName() + " is null",
+                            e.getMessage());
+                }
+            }
+        }
+        assertEquals(0, Spy.callCount());
+    }
+
+    @Test
+    void aReleasedContextNoLongerReachesItsObject() throws Throwable {
+        // A 32-bit context is the object's address, which the next object may well reuse.
+        assumeTrue(Spy.pointerSize() == 8);
+        Object stale = module(dvb, "Cfg");
+        dvb.release();
+        dvb = new DVB();
+        Method stop = natives(Cfg.class).stream().filter(m -> m.getName().equals("Cfg_Stop"))
+                .findFirst().get();
+        assertRaises(IllegalStateException.class, null, stale, stop, args(stop, -1));
+        assertEquals(0, Spy.callCount());
+    }
+}
