@@ -12,5 +12,6 @@ set(CMAKE_FIND_ROOT_PATH_MODE_INCLUDE BOTH)
 set(CMAKE_FIND_ROOT_PATH_MODE_PACKAGE BOTH)
 set(CMAKE_CROSSCOMPILING_EMULATOR qemu-arm -L /usr/arm-linux-gnueabihf)
 set(DVB_JVM OFF CACHE BOOL "no JVM for armhf here")
+set(DVB_RECEIVER OFF CACHE BOOL "the armhf build keeps to the library and the spy")
 # GCC notes every ABI change of argument passing since GCC 7.1; nothing here crosses it.
 set(CMAKE_CXX_FLAGS_INIT "-Wno-psabi")
