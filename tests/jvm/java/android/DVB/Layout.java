@@ -60,19 +60,12 @@ final class Layout {
             case "i64" -> 8;
             default -> kind.equals(p[1]) ? 4 : Integer.parseInt(p[1].substring(kind.length()));
         };
-        try {
-            slots.add(new Slot(cls.getField(p[0]), kind, base + Integer.parseInt(p[2]), width));
-        } catch (NoSuchFieldException e) {
-            throw new AssertionError(cls.getSimpleName() + " has no field " + p[0]);
-        }
+        Field f = Arrays.stream(cls.getFields()).filter(x -> x.getName().equals(p[0])).findFirst().get();
+        slots.add(new Slot(f, kind, base + Integer.parseInt(p[2]), width));
     }
 
-    Object create() {
-        try {
-            return cls.getDeclaredConstructor().newInstance();
-        } catch (ReflectiveOperationException e) {
-            throw new AssertionError(e);
-        }
+    Object create() throws ReflectiveOperationException {
+        return cls.getDeclaredConstructor().newInstance();
     }
 
     static int hash(int seed, int k) {
@@ -96,28 +89,24 @@ final class Layout {
     }
 
     /** Sets every mapped field of `o` (every int of a front-end block) from `seed`. */
-    Object fill(Object o, int seed) {
-        try {
-            int k = 0;
-            for (Slot s : slots) {
-                k++;
-                if (s.kind.equals("fe")) {
-                    for (String f : FE) cls.getField(f).setInt(o, hash(seed, ++k));
-                    cls.getField("type").setInt(o, FE_TYPES[Math.floorMod(seed, FE_TYPES.length)]);
-                } else if (s.field.getType() == long.class) {
-                    s.field.setLong(o, (long) hash(seed, k) << 32 | hash(seed, -k) & 0xFFFFFFFFL);
-                } else if (s.text()) {
-                    int width = s.kind.matches("lang|eng") ? 3 : s.kind.equals("path") ? s.width - 1 : s.width;
-                    boolean absent = s.kind.equals("eng") && seed % 4 == 3;
-                    s.field.set(o, absent ? null : text(seed + k, width, !s.kind.equals("path")));
-                } else if (s.field.getType() == int.class) {
-                    s.field.setInt(o, hash(seed, k));
-                }
+    Object fill(Object o, int seed) throws ReflectiveOperationException {
+        int k = 0;
+        for (Slot s : slots) {
+            k++;
+            if (s.kind.equals("fe")) {
+                for (String f : FE) cls.getField(f).setInt(o, hash(seed, ++k));
+                cls.getField("type").setInt(o, FE_TYPES[Math.floorMod(seed, FE_TYPES.length)]);
+            } else if (s.field.getType() == long.class) {
+                s.field.setLong(o, (long) hash(seed, k) << 32 | hash(seed, -k) & 0xFFFFFFFFL);
+            } else if (s.text()) {
+                int width = s.kind.matches("lang|eng") ? 3 : s.kind.equals("path") ? s.width - 1 : s.width;
+                boolean absent = s.kind.equals("eng") && seed % 4 == 3;
+                s.field.set(o, absent ? null : text(seed + k, width, !s.kind.equals("path")));
+            } else if (s.field.getType() == int.class) {
+                s.field.setInt(o, hash(seed, k));
             }
-            return o;
-        } catch (ReflectiveOperationException e) {
-            throw new AssertionError(e);
         }
+        return o;
     }
 
     /** Lays `o` over `record`, as the library must build the record from it. */
