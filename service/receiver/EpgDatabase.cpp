@@ -132,11 +132,13 @@ std::unique_ptr<EpgDatabase> EpgDatabase::open(const std::string& path, std::str
     // Another process (sqlite3 run by a user) may hold the lock for a moment.
     sqlite3_busy_timeout(db, 2000);
 
+    // The schema first: a file that is not ours fails here and is left as it was.
+    if (!epg->makeSchema(&reason)) return failed(reason);
     // Write-ahead log: a commit appends to the log, readers never see a half-written store, and
     // a process killed in the middle of a store leaves only uncommitted frames that the next
     // open ignores. synchronous=NORMAL syncs the log at checkpoints rather than at every
     // commit: a killed process loses nothing committed; only a power cut may lose the last
-    // commits, never consistency. The first statement also tells a file that is not a database.
+    // commits, never consistency.
     std::string mode;
     char* msg = nullptr;
     rc = sqlite3_exec(
@@ -157,7 +159,7 @@ std::unique_ptr<EpgDatabase> EpgDatabase::open(const std::string& path, std::str
     if (sqlite3_exec(db, sync, nullptr, nullptr, nullptr) != SQLITE_OK) {
         return failed(sqlite3_errmsg(db));
     }
-    if (!epg->makeSchema(&reason) || !epg->prepareAll(&reason)) return failed(reason);
+    if (!epg->prepareAll(&reason)) return failed(reason);
     return epg;
 }
 
