@@ -79,6 +79,11 @@ void bindText(sqlite3_stmt* s, int i, const std::string& t) {
 }
 
 // A BLOB or TEXT column as bytes; NULL (a column someone emptied by hand) reads as empty.
+uint64_t sectionId(ServiceKey s, unsigned tableId, unsigned section) {
+    return uint64_t{s.onid} << 48 | uint64_t{s.tsid} << 32 | uint64_t{s.sid} << 16 | tableId << 8 |
+           section;
+}
+
 std::string columnBytes(sqlite3_stmt* s, int col) {
     const void* p = sqlite3_column_blob(s, col);
     return p ? std::string(static_cast<const char*>(p), sqlite3_column_bytes(s, col))
@@ -159,7 +164,7 @@ std::unique_ptr<EpgDatabase> EpgDatabase::open(const std::string& path, std::str
     if (sqlite3_exec(db, sync, nullptr, nullptr, nullptr) != SQLITE_OK) {
         return failed(sqlite3_errmsg(db));
     }
-    if (!epg->prepareAll(&reason)) return failed(reason);
+    if (!epg->prepareAll(&reason) || !epg->loadVersions(&reason)) return failed(reason);
     return epg;
 }
 
@@ -208,7 +213,6 @@ bool EpgDatabase::prepareAll(std::string* error) {
             {begin_, "BEGIN IMMEDIATE"},
             {commit_, "COMMIT"},
             {rollback_, "ROLLBACK"},
-            {sectionVersion_, "SELECT version FROM section WHERE " SECTION_KEY},
             {deleteItems_, "DELETE FROM item WHERE " SECTION_KEY},
             {deleteEvents_, "DELETE FROM event WHERE " SECTION_KEY},
             // A section that lists an event id twice keeps the first.
@@ -254,25 +258,45 @@ std::string EpgDatabase::lastError() const {
     return error_;
 }
 
+bool EpgDatabase::loadVersions(std::string* error) {
+    Statement all;
+    if (!all.prepare(db_.get(),
+                     "SELECT onid, tsid, sid, table_id, section, version FROM section")) {
+        *error = sqlite3_errmsg(db_.get());
+        return false;
+    }
+    int rc;
+    while ((rc = sqlite3_step(all.get())) == SQLITE_ROW) {
+        int c[6];
+        for (int i = 0; i < 6; ++i) c[i] = sqlite3_column_int(all.get(), i);
+        ServiceKey key{static_cast<uint16_t>(c[0]), static_cast<uint16_t>(c[1]),
+                       static_cast<uint16_t>(c[2])};
+        versions_[sectionId(key, c[3] & 0xFF, c[4] & 0xFF)] = static_cast<uint8_t>(c[5]);
+    }
+    if (rc == SQLITE_DONE) return true;
+    *error = sqlite3_errmsg(db_.get());
+    return false;
+}
+
 bool EpgDatabase::storeSection(ServiceKey service, uint8_t tableId, uint8_t sectionNumber,
                                uint8_t version, const std::vector<dvbmodel::Event>& events) {
     std::lock_guard<std::mutex> lock(mutex_);
-    // A broadcast repeats its sections every few seconds: the same version costs one lookup
-    // and takes no write lock.
-    {
-        Run v(sectionVersion_);
-        bindSection(*v, service, tableId, sectionNumber);
-        int rc = v.step();
-        if (rc == SQLITE_ROW && sqlite3_column_int(*v, 0) == version) return true;
-        if (rc != SQLITE_ROW && rc != SQLITE_DONE) return fail("reading the section's version");
-    }
+    // A broadcast repeats its sections every few seconds: the same version again costs a look
+    // in memory.
+    uint64_t id = sectionId(service, tableId, sectionNumber);
+    auto known = versions_.find(id);
+    if (known != versions_.end() && known->second == version) return true;
     {
         Run b(begin_);
         if (b.step() != SQLITE_DONE) return fail("starting a store");
     }
-    if (replaceSection(service, tableId, sectionNumber, version, events)) {
+    if (replaceSection(service, tableId, sectionNumber, version, known != versions_.end(),
+                       events)) {
         Run c(commit_);
-        if (c.step() == SQLITE_DONE) return true;
+        if (c.step() == SQLITE_DONE) {
+            versions_[id] = version;
+            return true;
+        }
         fail("committing a store");
     }
     Run r(rollback_);
@@ -280,9 +304,12 @@ bool EpgDatabase::storeSection(ServiceKey service, uint8_t tableId, uint8_t sect
     return false;
 }
 
+// Within the store's transaction. A section never stored before has no rows to remove.
 bool EpgDatabase::replaceSection(ServiceKey service, uint8_t tableId, uint8_t sectionNumber,
-                                 uint8_t version, const std::vector<dvbmodel::Event>& events) {
+                                 uint8_t version, bool stored,
+                                 const std::vector<dvbmodel::Event>& events) {
     for (const Statement* del : {&deleteItems_, &deleteEvents_}) {
+        if (!stored) break;
         Run d(*del);
         bindSection(*d, service, tableId, sectionNumber);
         if (d.step() != SQLITE_DONE) return fail("removing a section's events");

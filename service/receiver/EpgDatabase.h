@@ -14,6 +14,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <unordered_map>
 #include <vector>
 
 struct sqlite3;
@@ -93,9 +94,10 @@ private:
     EpgDatabase() = default;
     bool makeSchema(std::string* error);
     bool prepareAll(std::string* error);
+    bool loadVersions(std::string* error);
     bool fail(const char* what) const;
     bool replaceSection(ServiceKey service, uint8_t tableId, uint8_t sectionNumber, uint8_t version,
-                        const std::vector<dvbmodel::Event>& events);
+                        bool stored, const std::vector<dvbmodel::Event>& events);
     std::optional<dvbmodel::Event> readOne(sqlite3_stmt* stmt, ServiceKey service,
                                            int64_t time) const;
     bool readItems(ServiceKey service, sqlite3_stmt* row, dvbmodel::Event& event) const;
@@ -110,7 +112,10 @@ private:
     mutable std::mutex mutex_;
     mutable std::string error_;
     Statement begin_, commit_, rollback_;
-    Statement sectionVersion_, deleteItems_, deleteEvents_, insertEvent_, insertItem_, putSection_;
+    // The version of every stored section, as the section table holds it (the receiver is the
+    // file's one writer): a section that comes round again costs no query.
+    std::unordered_map<uint64_t, uint8_t> versions_;
+    Statement deleteItems_, deleteEvents_, insertEvent_, insertItem_, putSection_;
     Statement runningAt_, startingAfter_, startingIn_, itemsOf_, count_;
     Statement addService_, clearServices_, listServices_;
 };

@@ -146,6 +146,8 @@ TEST_F(EpgDatabaseTest, ReopensWithWhatWasStored) {
     }
     auto db = open();
     EXPECT_EQ(dumps(all(*db)), dumps(stored));
+    ASSERT_TRUE(db->storeSection(kSvc, 0x50, 0, 1, {event(9, 0, 1)}));  // a version it knows
+    EXPECT_EQ(dumps(all(*db)), dumps(stored));
     auto services = db->services();
     ASSERT_EQ(services.size(), 2u);
     EXPECT_TRUE(services[0].key == kSvc && services[0].tpIndex == 7 && services[0].netIndex == 8 &&

@@ -136,7 +136,7 @@ void BM_BareInsert(benchmark::State& state) {
         removeDatabase(path);
         openOrDie(path);  // the same schema
         sqlite3* db = nullptr;
-        sqlite3_open(path.c_str(), &db);
+        sqlite3_open_v2(path.c_str(), &db, SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX, nullptr);
         sqlite3_exec(db, "PRAGMA journal_mode = WAL; PRAGMA synchronous = NORMAL", 0, 0, 0);
         sqlite3_stmt* begin = prepare(db, "BEGIN IMMEDIATE");
         sqlite3_stmt* commit = prepare(db, "COMMIT");
@@ -232,7 +232,8 @@ void BM_EventAt(benchmark::State& state) {
 // column read as eventAt reads it.
 void BM_BareQuery(benchmark::State& state) {
     sqlite3* db = nullptr;
-    sqlite3_open_v2(lookupDatabase().c_str(), &db, SQLITE_OPEN_READONLY, nullptr);
+    sqlite3_open_v2(lookupDatabase().c_str(), &db, SQLITE_OPEN_READONLY | SQLITE_OPEN_NOMUTEX,
+                    nullptr);
     sqlite3_stmt* event = prepare(
             db,
             "SELECT table_id, section, event_id, start, duration, running_status, content, "
@@ -282,6 +283,7 @@ BENCHMARK(BM_BareQuery)->Repetitions(3);
 // Keeps the median real time of each benchmark besides printing the usual table.
 class Medians : public benchmark::ConsoleReporter {
 public:
+    Medians() : ConsoleReporter(isatty(STDOUT_FILENO) ? OO_ColorTabular : OO_Tabular) {}
     void ReportRuns(const std::vector<Run>& runs) override {
         for (const Run& r : runs) {
             if (r.run_type == Run::RT_Aggregate && r.aggregate_name == "median") {
