@@ -46,7 +46,7 @@ CREATE TABLE service (
 // Resets a reused statement when the scope that ran it ends, on every path.
 class Run {
 public:
-    explicit Run(const Statement& s) : stmt_(s.get()) {}
+    explicit Run(const SqlStatement& s) : stmt_(s.get()) {}
     ~Run() { sqlite3_reset(stmt_); }
     Run(const Run&) = delete;
     Run& operator=(const Run&) = delete;
@@ -78,12 +78,13 @@ void bindText(sqlite3_stmt* s, int i, const std::string& t) {
     sqlite3_bind_text64(s, i, t.data(), t.size(), SQLITE_STATIC, SQLITE_UTF8);
 }
 
-// A BLOB or TEXT column as bytes; NULL (a column someone emptied by hand) reads as empty.
+// One number for a section of a service's table: the key of the versions kept in memory.
 uint64_t sectionId(ServiceKey s, unsigned tableId, unsigned section) {
     return uint64_t{s.onid} << 48 | uint64_t{s.tsid} << 32 | uint64_t{s.sid} << 16 | tableId << 8 |
            section;
 }
 
+// A BLOB or TEXT column as bytes; NULL (a column someone emptied by hand) reads as empty.
 std::string columnBytes(sqlite3_stmt* s, int col) {
     const void* p = sqlite3_column_blob(s, col);
     return p ? std::string(static_cast<const char*>(p), sqlite3_column_bytes(s, col))
@@ -105,11 +106,11 @@ void readEvent(sqlite3_stmt* s, dvbmodel::Event& e) {
 
 }  // namespace
 
-Statement::~Statement() {
+SqlStatement::~SqlStatement() {
     sqlite3_finalize(stmt_);
 }
 
-bool Statement::prepare(sqlite3* db, const char* sql) {
+bool SqlStatement::prepare(sqlite3* db, const char* sql) {
     return sqlite3_prepare_v3(db, sql, -1, SQLITE_PREPARE_PERSISTENT, &stmt_, nullptr) == SQLITE_OK;
 }
 
@@ -176,7 +177,7 @@ bool EpgDatabase::makeSchema(std::string* error) {
         *error = sqlite3_errmsg(db);
         return false;
     }
-    Statement version, tables;
+    SqlStatement version, tables;
     bool read = version.prepare(db, "PRAGMA user_version") &&
                 tables.prepare(db, "SELECT count(*) FROM sqlite_schema") &&
                 sqlite3_step(version.get()) == SQLITE_ROW &&
@@ -207,7 +208,7 @@ bool EpgDatabase::makeSchema(std::string* error) {
 
 bool EpgDatabase::prepareAll(std::string* error) {
     struct {
-        Statement& stmt;
+        SqlStatement& stmt;
         const char* sql;
     } const statements[] = {
             {begin_, "BEGIN IMMEDIATE"},
@@ -259,7 +260,7 @@ std::string EpgDatabase::lastError() const {
 }
 
 bool EpgDatabase::loadVersions(std::string* error) {
-    Statement all;
+    SqlStatement all;
     if (!all.prepare(db_.get(),
                      "SELECT onid, tsid, sid, table_id, section, version FROM section")) {
         *error = sqlite3_errmsg(db_.get());
@@ -308,7 +309,7 @@ bool EpgDatabase::storeSection(ServiceKey service, uint8_t tableId, uint8_t sect
 bool EpgDatabase::replaceSection(ServiceKey service, uint8_t tableId, uint8_t sectionNumber,
                                  uint8_t version, bool stored,
                                  const std::vector<dvbmodel::Event>& events) {
-    for (const Statement* del : {&deleteItems_, &deleteEvents_}) {
+    for (const SqlStatement* del : {&deleteItems_, &deleteEvents_}) {
         if (!stored) break;
         Run d(*del);
         bindSection(*d, service, tableId, sectionNumber);

@@ -40,12 +40,12 @@ struct EpgService {
 using TextDecoder = std::function<std::string(std::string_view)>;
 
 // Owns one prepared statement; finalizes it when destroyed.
-class Statement {
+class SqlStatement {
 public:
-    Statement() = default;
-    Statement(const Statement&) = delete;
-    Statement& operator=(const Statement&) = delete;
-    ~Statement();
+    SqlStatement() = default;
+    SqlStatement(const SqlStatement&) = delete;
+    SqlStatement& operator=(const SqlStatement&) = delete;
+    ~SqlStatement();
     bool prepare(sqlite3* db, const char* sql);
     sqlite3_stmt* get() const { return stmt_; }
 
@@ -111,13 +111,13 @@ private:
     // One connection, its statements reused: calls from several threads take turns.
     mutable std::mutex mutex_;
     mutable std::string error_;
-    Statement begin_, commit_, rollback_;
+    SqlStatement begin_, commit_, rollback_;
     // The version of every stored section, as the section table holds it (the receiver is the
     // file's one writer): a section that comes round again costs no query.
     std::unordered_map<uint64_t, uint8_t> versions_;
-    Statement deleteItems_, deleteEvents_, insertEvent_, insertItem_, putSection_;
-    Statement runningAt_, startingAfter_, startingIn_, itemsOf_, count_;
-    Statement addService_, clearServices_, listServices_;
+    SqlStatement deleteItems_, deleteEvents_, insertEvent_, insertItem_, putSection_;
+    SqlStatement runningAt_, startingAfter_, startingIn_, itemsOf_, count_;
+    SqlStatement addService_, clearServices_, listServices_;
 };
 
 }  // namespace dvbrx
