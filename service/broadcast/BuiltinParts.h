@@ -51,7 +51,8 @@ private:
 constexpr int64_t kDaySeconds = 86400;
 constexpr int kScheduleDays = 7;
 
-// Seven days of contiguous events from `firstDay` (a UTC midnight), ids from 1.
+// Seven days of contiguous events from `firstDay` (a UTC midnight), ids from 1. Their running
+// status stays 0 (undefined), as in a schedule table: the receiver's clock tells which runs.
 std::vector<Event> weekSchedule(uint16_t serviceId, Profile profile, Language language,
                                 Charset table, int64_t firstDay);
 

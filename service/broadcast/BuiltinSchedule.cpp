@@ -190,9 +190,11 @@ Event makeEvent(const Programme& p, Prng& prng, Language language, Charset table
             item("Regie", "Director", a);
             item("Darsteller", "Cast", std::string(b) + ", " + kPeople[prng.below(12)]);
             item("Jahr", "Year", std::to_string(1990 + prng.below(35)));
-            more += l == 0 ? " Ein Film von " : " A film by ";
-            more += a;
-            more += '.';
+            if (p.genre == Genre::Film) {
+                more += l == 0 ? " Ein Film von " : " A film by ";
+                more += a;
+                more += '.';
+            }
             break;
         case Credits::Presenter:
             item("Moderation", "Presenter", a);
@@ -222,18 +224,23 @@ std::vector<Event> weekSchedule(uint16_t serviceId, Profile profile, Language la
         // A day's programmes depend on the service and the day only.
         Prng prng((uint64_t(serviceId) << 32) ^ uint64_t(dayStart / kDaySeconds));
         int64_t t = dayStart;
+        const Programme* previous = nullptr;
         while (t < dayEnd) {
             // Radio: the news on the hour, then music until the next hour.
             const bool hourNews = profile == Profile::Radio && t % 3600 == 0;
-            const Programme& p = hourNews ? kCatalogue[0] : draw(prng, profile);
-            Event e = makeEvent(p, prng, language, table);
-            uint32_t minutes = p.minMinutes;
+            const Programme* p = hourNews ? &kCatalogue[0] : &draw(prng, profile);
+            // The same programme twice in a row only where the profile offers nothing else.
+            for (int tries = 0; !hourNews && p == previous && tries < 4; ++tries)
+                p = &draw(prng, profile);
+            previous = p;
+            Event e = makeEvent(*p, prng, language, table);
+            uint32_t minutes = p->minMinutes;
             if (hourNews) {
                 minutes = 10;
             } else if (profile == Profile::Radio) {
                 minutes = 50;
-            } else if (p.maxMinutes > p.minMinutes) {
-                minutes += 5 * prng.below((p.maxMinutes - p.minMinutes) / 5 + 1);
+            } else if (p->maxMinutes > p->minMinutes) {
+                minutes += 5 * prng.below((p->maxMinutes - p->minMinutes) / 5 + 1);
             }
             e.id = id++;
             e.start = t;
