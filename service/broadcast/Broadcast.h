@@ -138,8 +138,8 @@ struct RegionRef {
 
 // A complete subtitle display set as a decoder holds it after its end-of-display-set segment.
 struct DisplaySet {
-    int64_t time = 0;    // milliseconds from the start of the broadcast's loop
-    uint8_t pageId = 0;  // composition page id
+    int64_t time = 0;     // milliseconds from the start of the broadcast's loop
+    uint16_t pageId = 0;  // composition page id (16 bits, as the component announces it)
     uint8_t timeout = 0, version = 0, state = 0;  // page composition
     std::vector<RegionRef> placements;
     std::vector<Region> regions;
@@ -152,8 +152,15 @@ struct DisplaySet {
 };
 
 // One teletext page (a subpage of it) at level 1: 25 rows of 40 characters as transmitted
-// (7 bits, parity removed; spacing attributes as their control codes), row 0 the header.
+// (7 bits, parity removed; spacing attributes as their control codes), row 0 the header:
+// columns 0..7 blank where the header packet carries its address (a decoder shows the page
+// number there), columns 8..39 the 32 characters it carries, ending with the clock "hh:mm:ss"
+// as of the transmission (a receiver stamps its own clock there, as a broadcaster does).
+// The page list is a sequence of transmissions: a transmission stays the current version of its
+// number and subcode until a later one of the same number and subcode; a decoder that shows a
+// number shows the subpage transmitted last. Rotating subpages are so many transmissions.
 struct TeletextPage {
+    int64_t time = 0;  // milliseconds from the start of the broadcast's loop: when it is sent
     uint16_t number = 0x100;  // magazine * 0x100 + page, in BCD: 0x100 .. 0x8FF
     uint16_t subcode = 0;
     uint16_t controlBits = 0;  // C4 .. C14 as bits 4 .. 14 (C11 serial, C12..C14 national option)
@@ -173,7 +180,7 @@ struct Service {
     std::vector<Component> components;
     std::vector<Event> events;           // by start time; the clock tells present and following
     std::vector<DisplaySet> subtitles;   // of its subtitle components, in time order
-    std::vector<TeletextPage> teletext;  // of its teletext component
+    std::vector<TeletextPage> teletext;  // of its teletext component, in time order
 };
 
 struct Transport {
@@ -191,8 +198,10 @@ struct Network {
 
 struct Broadcast {
     std::vector<Network> networks;
-    int64_t start = 0;       // UTC at the start of the broadcast's loop
-    int64_t loopMillis = 0;  // length of one loop of a captured broadcast; 0 for no loop
+    int64_t start = 0;  // UTC at the start of the broadcast's loop
+    // Length of one loop of the timed content (display sets, teletext transmissions), which
+    // repeats from the start of the loop; 0 for no loop. Events keep their absolute times.
+    int64_t loopMillis = 0;
 };
 
 }  // namespace dvbmodel
