@@ -45,7 +45,7 @@ char16_t convertOne(iconv_t cd, const char* in, size_t n) {
     char* dst = reinterpret_cast<char*>(out);
     size_t srcLeft = n, dstLeft = sizeof out;
     if (iconv(cd, &src, &srcLeft, &dst, &dstLeft) == size_t(-1) || srcLeft != 0 ||
-        dstLeft != sizeof out - sizeof(wchar_t) || out[0] < 0 || out[0] > 0xFFFF) {
+        dstLeft != sizeof out - sizeof(wchar_t) || uint32_t(out[0]) > 0xFFFF) {
         return 0;
     }
     return char16_t(out[0]);
