@@ -18,15 +18,36 @@ enum class Delivery : uint8_t { Satellite, Cable, Terrestrial };
 
 // Codes as the receiver documents them for the API's front-end words (README "Receiver codes").
 enum class Polarization : uint8_t { Horizontal = 0, Vertical = 1, Left = 2, Right = 3 };
-enum class Modulation : uint8_t { Qpsk = 0, Psk8 = 1, Qam16 = 2, Qam32 = 3, Qam64 = 4, Qam128 = 5, Qam256 = 6, Auto = 7 };
-enum class Fec : uint8_t { F1_2 = 0, F2_3 = 1, F3_4 = 2, F5_6 = 3, F7_8 = 4, F3_5 = 5, F4_5 = 6, F8_9 = 7, F9_10 = 8, None = 9, Auto = 10 };
+enum class Modulation : uint8_t {
+    Qpsk = 0,
+    Psk8 = 1,
+    Qam16 = 2,
+    Qam32 = 3,
+    Qam64 = 4,
+    Qam128 = 5,
+    Qam256 = 6,
+    Auto = 7
+};
+enum class Fec : uint8_t {
+    F1_2 = 0,
+    F2_3 = 1,
+    F3_4 = 2,
+    F5_6 = 3,
+    F7_8 = 4,
+    F3_5 = 5,
+    F4_5 = 6,
+    F8_9 = 7,
+    F9_10 = 8,
+    None = 9,
+    Auto = 10
+};
 enum class Rolloff : uint8_t { R35 = 0, R25 = 1, R20 = 2 };
 
 // How a transponder or multiplex is tuned.
 struct Tuning {
     Delivery delivery = Delivery::Terrestrial;
-    uint32_t frequencyKHz = 0;   // satellite: the downlink frequency; others: the centre frequency
-    uint32_t symbolRate = 0;     // symbols per second (satellite, cable)
+    uint32_t frequencyKHz = 0;  // satellite: the downlink frequency; others: the centre frequency
+    uint32_t symbolRate = 0;    // symbols per second (satellite, cable)
     Modulation modulation = Modulation::Auto;
     Fec fec = Fec::Auto;
     Polarization polarization = Polarization::Horizontal;  // satellite
@@ -51,15 +72,15 @@ struct Component {
     uint16_t pid = 0x1FFF;
     uint8_t streamType = 0;  // ISO/IEC 13818-1 table 2-34
     uint8_t componentTag = 0;
-    std::string language;    // ISO 639-2 code, three letters, or empty
-    bool ac3 = false;        // audio: AC-3 descriptor
-    bool eac3 = false;       // audio: enhanced AC-3 descriptor
-    uint32_t frameRateMilli = 0;  // video: frames per 1000 seconds (25000 = 25 Hz)
+    std::string language;            // ISO 639-2 code, three letters, or empty
+    bool ac3 = false;                // audio: AC-3 descriptor
+    bool eac3 = false;               // audio: enhanced AC-3 descriptor
+    uint32_t frameRateMilli = 0;     // video: frames per 1000 seconds (25000 = 25 Hz)
     uint16_t width = 0, height = 0;  // video
     uint8_t subtitlingType = 0x10;   // subtitle: EN 300 468 table 26
     uint16_t compositionPageId = 0, ancillaryPageId = 0;  // subtitle
-    std::vector<TeletextRef> pages;  // teletext
-    std::string name;                // a name for the track, if it has one
+    std::vector<TeletextRef> pages;                       // teletext
+    std::string name;                                     // a name for the track, if it has one
 };
 
 // An item of an extended event description: description and text, as broadcast bytes.
@@ -70,16 +91,16 @@ struct Item {
 
 struct Event {
     uint16_t id = 0;
-    int64_t start = 0;        // UTC, seconds since 1970
-    uint32_t duration = 0;    // seconds
+    int64_t start = 0;          // UTC, seconds since 1970
+    uint32_t duration = 0;      // seconds
     uint8_t runningStatus = 0;  // EN 300 468 table 6 (4 running, 1 not running)
-    std::string language;     // of the descriptors below
-    std::string name;         // short event descriptor
+    std::string language;       // of the descriptors below
+    std::string name;           // short event descriptor
     std::string text;
-    std::string extendedText; // extended event descriptors, joined
+    std::string extendedText;  // extended event descriptors, joined
     std::vector<Item> items;
-    uint8_t content = 0;        // first content descriptor nibbles: level 1 << 4 | level 2
-    uint8_t parentalRating = 0; // EN 300 468 rating byte: minimum age - 3, 0 undefined
+    uint8_t content = 0;         // first content descriptor nibbles: level 1 << 4 | level 2
+    uint8_t parentalRating = 0;  // EN 300 468 rating byte: minimum age - 3, 0 undefined
 };
 
 // One CLUT entry as a subtitle stream carries it.
@@ -117,7 +138,7 @@ struct RegionRef {
 
 // A complete subtitle display set as a decoder holds it after its end-of-display-set segment.
 struct DisplaySet {
-    int64_t time = 0;  // milliseconds from the start of the broadcast's loop
+    int64_t time = 0;    // milliseconds from the start of the broadcast's loop
     uint8_t pageId = 0;  // composition page id
     uint8_t timeout = 0, version = 0, state = 0;  // page composition
     std::vector<RegionRef> placements;
@@ -146,13 +167,13 @@ struct Service {
     std::string provider, name;
     uint16_t lcn = 0;  // logical channel number, 0 if none
     bool visible = true;
-    bool scrambled = false;            // free_CA_mode
-    std::vector<uint16_t> caSystems;   // CA system ids
+    bool scrambled = false;           // free_CA_mode
+    std::vector<uint16_t> caSystems;  // CA system ids
     uint16_t pmtPid = 0, pcrPid = 0x1FFF;
     std::vector<Component> components;
-    std::vector<Event> events;  // by start time; the clock tells present and following
-    std::vector<DisplaySet> subtitles;     // of its subtitle components, in time order
-    std::vector<TeletextPage> teletext;    // of its teletext component
+    std::vector<Event> events;           // by start time; the clock tells present and following
+    std::vector<DisplaySet> subtitles;   // of its subtitle components, in time order
+    std::vector<TeletextPage> teletext;  // of its teletext component
 };
 
 struct Transport {
