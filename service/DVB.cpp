@@ -5,11 +5,15 @@
 #include <algorithm>
 #include <chrono>
 #include <cstdlib>
+#include <cstring>
 #include <mutex>
 #include <thread>
 
 #include "Service.h"
 #include "spy/Spy.h"
+#ifdef DVB_RECEIVER
+#include "receiver/Receiver.h"
+#endif
 
 namespace dvbsvc {
 namespace {
@@ -57,6 +61,18 @@ void startHeartbeat() {
             }
         }).detach();
     });
+}
+
+// The backend of DVB objects when none was set: the emulated receiver where it is built in,
+// else the spy; DVB_SERVICE=spy or DVB_SERVICE=receiver chooses.
+Backend& defaultBackend() {
+#ifdef DVB_RECEIVER
+    const char* choice = getenv("DVB_SERVICE");
+    if (choice != nullptr && strcmp(choice, "spy") == 0) return dvbspy::backend();
+    return dvbrx::backend();
+#else
+    return dvbspy::backend();
+#endif
 }
 
 }  // namespace
@@ -118,7 +134,7 @@ DVB::DVB() : mService(nullptr), mFlags(0) {
         backend = dvbsvc::gBackend;
         dvbsvc::gLive.push_back({this, wp<DVB>(this), false});
     }
-    if (backend == nullptr) backend = &dvbspy::backend();
+    if (backend == nullptr) backend = &dvbsvc::defaultBackend();
     backend->createModules(*this);
     dvbsvc::startHeartbeat();
 }

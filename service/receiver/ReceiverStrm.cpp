@@ -1,0 +1,382 @@
+// The stream module: playing services, their status, components and events.
+#include <algorithm>
+#include <cstring>
+
+#include "Modules.h"
+
+namespace dvbrx {
+namespace {
+
+constexpr int64_t kPtsWrap = int64_t{1} << 33;
+// An audio frame of 1152 samples at 48 kHz lasts 24 ms: 2160 ticks of 90 kHz.
+constexpr int64_t kAudioFrameTicks = 2160;
+// Bit rates of a time-shift recording, bits per second.
+constexpr int64_t kTvBitRate = 4000000, kRadioBitRate = 192000;
+// Services the event collection keeps at most.
+constexpr size_t kMaxEpgServices = 1024;
+
+template <size_t N>
+void copyText(char (&field)[N], const std::string& text) {
+    size_t n = std::min(text.size(), N - 1);
+    memcpy(field, text.data(), n);
+    field[n] = '\0';
+}
+
+void fillEvent(const dvbmodel::Event& ev, uint8_t runStatus, EpgEvent* e, ExtEpgEvent* x) {
+    e->evtId = ev.id;
+    e->startTime = static_cast<int32_t>(ev.start);
+    e->duration = static_cast<int32_t>(ev.duration);
+    e->runStatus = runStatus;
+    e->parentalRating = ev.parentalRating;
+    e->content = ev.content;
+    copyText(e->name, ev.name);
+    copyText(e->text, ev.text);
+    e->extendedFlag = !ev.extendedText.empty() || !ev.items.empty() ? 1 : 0;
+    if (x == nullptr) return;
+    size_t n = std::min<size_t>(ev.items.size(), kExtEpgItems);
+    x->itemCount = static_cast<uint32_t>(n);
+    for (size_t i = 0; i < n; ++i) {
+        copyText(x->items[i].itemDesc, ev.items[i].description);
+        copyText(x->items[i].itemText, ev.items[i].text);
+    }
+    copyText(x->text, ev.extendedText);
+}
+
+const dvbmodel::Component* component(const dvbmodel::Service& svc, dvbmodel::Kind kind,
+                                     uint16_t pid) {
+    for (const auto& c : svc.components) {
+        if (c.kind == kind && c.pid == pid) return &c;
+    }
+    return nullptr;
+}
+
+}  // namespace
+
+int32_t ReceiverStrm::Init() {
+    return kOk;
+}
+
+int32_t ReceiverStrm::Open(const STRM_OpenSettings* settings) {
+    std::lock_guard<std::mutex> lock(mRx->mLock);
+    if (settings == nullptr || !mRx->validFrontend(settings->frontend) || settings->demux < 0 ||
+        memchr(settings->szPath, 0, sizeof settings->szPath) == nullptr)
+        return kErrBadParameter;
+    // Playing a recording back comes with the transport-stream reader.
+    if (settings->szPath[0] != '\0') return kErrNotSupported;
+    if (mRx->streams.size() >= kMaxHandles) return kErrTooMany;
+    int32_t h = mRx->newHandle();
+    Stream& s = mRx->streams[h];
+    s.frontend = settings->frontend;
+    s.demux = settings->demux;
+    return h;
+}
+
+int32_t ReceiverStrm::Close(int32_t handle) {
+    std::lock_guard<std::mutex> lock(mRx->mLock);
+    if (mRx->streams.erase(handle) == 0) return kErrBadHandle;
+    // Decoders fed by the stream end with it.
+    for (auto* decoders : {&mRx->subtitles, &mRx->teletexts}) {
+        for (auto it = decoders->begin(); it != decoders->end();) {
+            it = it->second.stream == handle ? decoders->erase(it) : std::next(it);
+        }
+    }
+    return kOk;
+}
+
+int32_t ReceiverStrm::Start(int32_t handle, const STRM_Settings* settings) {
+    std::lock_guard<std::mutex> lock(mRx->mLock);
+    auto it = mRx->streams.find(handle);
+    if (it == mRx->streams.end()) return kErrBadHandle;
+    if (settings == nullptr || !Receiver::plausible(settings->fe)) return kErrBadParameter;
+    Stream& s = it->second;
+    int64_t now = mRx->clock().nowMillis();
+    // Starting a service tunes the stream's front end, as a receiver does.
+    mRx->tune(s.frontend, settings->fe);
+    s.settings = *settings;
+    s.started = false;
+    Signal sig = mRx->signal(settings->fe, now, now);
+    if (sig.transport == nullptr) return kErrNoSignal;
+    const dvbmodel::Service* svc = nullptr;
+    for (const auto& candidate : sig.transport->services) {
+        if (candidate.id == settings->svcId) svc = &candidate;
+    }
+    if (svc == nullptr) return kErrNoService;
+    s.started = true;
+    s.frozen = false;
+    s.startedAt = now;
+    s.network = sig.network;
+    s.transport = sig.transport;
+    s.service = svc;
+    s.reportedEvent = -1;
+    s.shifting = false;
+    return kOk;
+}
+
+int32_t ReceiverStrm::Stop(int32_t handle, int32_t flag) {
+    std::lock_guard<std::mutex> lock(mRx->mLock);
+    auto it = mRx->streams.find(handle);
+    if (it == mRx->streams.end()) return kErrBadHandle;
+    if (!it->second.started) return kErrNotStarted;
+    it->second.started = false;
+    it->second.shifting = false;
+    // Flag 1 keeps the last picture on the screen; 0 blanks it.
+    it->second.frozen = flag == 1;
+    return kOk;
+}
+
+int32_t ReceiverStrm::GetSettings(int32_t handle, STRM_Settings* settings) {
+    std::lock_guard<std::mutex> lock(mRx->mLock);
+    if (settings == nullptr) return kErrBadParameter;
+    auto it = mRx->streams.find(handle);
+    if (it == mRx->streams.end()) return kErrBadHandle;
+    *settings = it->second.settings;
+    return kOk;
+}
+
+int32_t ReceiverStrm::SetSettings(int32_t handle, const STRM_Settings* settings) {
+    std::lock_guard<std::mutex> lock(mRx->mLock);
+    if (settings == nullptr) return kErrBadParameter;
+    auto it = mRx->streams.find(handle);
+    if (it == mRx->streams.end()) return kErrBadHandle;
+    Stream& s = it->second;
+    if (!s.started) return kErrNotStarted;
+    bool live = settings->playSpeed == 0 && settings->playSpeedDiv == 0 && settings->posTime == 0;
+    if (!live && (settings->playSpeedDiv <= 0 || settings->posTime < 0)) return kErrBadParameter;
+    int64_t now = mRx->clock().nowMillis();
+    s.settings = *settings;
+    if (live) {
+        s.shifting = false;
+        return kOk;
+    }
+    // Time shift: the receiver records from the first such setting on and plays from posTime
+    // seconds into the recording at playSpeed / playSpeedDiv.
+    if (!s.shifting) {
+        s.shifting = true;
+        s.shiftSince = now;
+    }
+    s.shiftPos = std::min(int64_t{settings->posTime} * 1000, now - s.shiftSince);
+    s.shiftAt = now;
+    return kOk;
+}
+
+int32_t ReceiverStrm::GetStatus(int32_t handle, STRM_GetStatus* status) {
+    std::lock_guard<std::mutex> lock(mRx->mLock);
+    if (status == nullptr) return kErrBadParameter;
+    auto it = mRx->streams.find(handle);
+    if (it == mRx->streams.end()) return status->result = kErrBadHandle;
+    const Stream& s = it->second;
+    if (!s.started) {
+        status->pictureStatus = s.frozen ? kFrozen : kNoPicture;
+        return status->result = kErrNotStarted;
+    }
+    const Frontend& fe = mRx->frontends[s.frontend];
+    int64_t now = mRx->clock().nowMillis();
+    Signal sig = mRx->signal(fe.params, fe.tunedAt, now);
+    status->feStatus = sig.status;
+    status->feStrength = sig.strength;
+    status->feBer = sig.ber;
+    status->feSnr = sig.snr;
+    const dvbmodel::Service& svc = *s.service;
+    bool onAir = sig.transport == s.transport && (sig.status & kFeLock) != 0;
+    bool blocked = svc.scrambled && mRx->outputs.caStandby;
+    const auto* video = component(svc, dvbmodel::Kind::Video, s.settings.videoPid);
+    const auto* audio = component(svc, dvbmodel::Kind::Audio, s.settings.audioPid);
+    status->pictureStatus = onAir && blocked ? kScrambled : kNoPicture;
+    if (onAir && !blocked) {
+        int64_t from = std::max(s.startedAt, sig.lockedAt);
+        uint32_t key = static_cast<uint32_t>(s.transport->tsid) << 16 | svc.id;
+        int64_t pts = (mix(mRx->clock().seed(), key, 3) + (now - from) * 90) % kPtsWrap;
+        status->localPts = static_cast<int32_t>(static_cast<uint32_t>(pts));
+        if (video != nullptr && video->frameRateMilli > 0) {
+            int64_t frame = int64_t{90000} * 1000 / video->frameRateMilli;
+            status->videoPts = static_cast<int32_t>(static_cast<uint32_t>(pts / frame * frame));
+            status->fpsInteger = static_cast<int32_t>(video->frameRateMilli / 1000);
+            status->fpsDecimal = static_cast<int32_t>(video->frameRateMilli % 1000);
+            status->pictureStatus = kDecoding;
+        }
+        if (audio != nullptr) {
+            status->audioPts = static_cast<int32_t>(
+                    static_cast<uint32_t>(pts / kAudioFrameTicks * kAudioFrameTicks));
+        }
+    }
+    if (s.shifting) {
+        int64_t recorded = now - s.shiftSince;
+        int64_t bitRate = video != nullptr ? kTvBitRate : kRadioBitRate;
+        status->recstate = kPvrActive;
+        status->recduration = static_cast<int32_t>(recorded / 1000);
+        status->recsize = recorded * bitRate / 8000;
+        const dvbmodel::Event* recEvent = Receiver::eventAt(svc, s.shiftSince / 1000);
+        status->recevent = recEvent != nullptr ? recEvent->id : 0;
+        status->recstartTime = static_cast<int32_t>(s.shiftSince / 1000);
+        status->reccurTime = static_cast<int32_t>(now / 1000);
+        int32_t num = s.settings.playSpeed, div = s.settings.playSpeedDiv;
+        int64_t pos = std::clamp(s.shiftPos + (now - s.shiftAt) * num / div, int64_t{0}, recorded);
+        status->pbstate = num == 0 ? kPvrPaused : num == div ? kPvrActive : kPvrTrick;
+        status->pbposition = static_cast<int32_t>(pos / 1000);
+        const dvbmodel::Event* pbEvent = Receiver::eventAt(svc, (s.shiftSince + pos) / 1000);
+        status->pbevent = pbEvent != nullptr ? pbEvent->id : 0;
+        status->pbstartTime = status->recstartTime;
+        status->pbendTime = status->reccurTime;
+    }
+    return status->result = kOk;
+}
+
+int32_t ReceiverStrm::CreatStreamInfo(int32_t handle, STRM_StreamInfo* info) {
+    std::lock_guard<std::mutex> lock(mRx->mLock);
+    if (info == nullptr) return kErrBadParameter;
+    auto it = mRx->streams.find(handle);
+    if (it == mRx->streams.end()) return kErrBadHandle;
+    if (!it->second.started) return kErrNotStarted;
+    const dvbmodel::Service& svc = *it->second.service;
+    for (const auto& c : svc.components) {
+        switch (c.kind) {
+            case dvbmodel::Kind::Video:
+                if (info->videoCount < kStreamComponents) {
+                    VideoContent& v = info->video[info->videoCount++];
+                    v.pid = c.pid;
+                    v.type = c.streamType;
+                }
+                break;
+            case dvbmodel::Kind::Audio:
+                if (info->audioCount < kStreamComponents) {
+                    AudioContent& a = info->audio[info->audioCount++];
+                    a.pid = c.pid;
+                    a.isDolbyAC3 = c.ac3 || c.eac3 ? 1 : 0;
+                    a.type = c.streamType;
+                    copyText(a.langCode0, c.language);
+                    a.componetTag = c.componentTag;
+                    copyText(a.streamName, c.name);
+                }
+                break;
+            case dvbmodel::Kind::Subtitle:
+                if (info->subtitleCount < kStreamComponents) {
+                    SubtitleContent& t = info->subtitle[info->subtitleCount++];
+                    t.pid = c.pid;
+                    t.type = c.subtitlingType;
+                    copyText(t.langCode, c.language);
+                    t.compositionPageId = c.compositionPageId;
+                    t.ancillaryPageId = c.ancillaryPageId;
+                }
+                break;
+            case dvbmodel::Kind::Teletext:
+                // One entry per page that the teletext descriptor announces.
+                for (const auto& page : c.pages) {
+                    if (info->teletextCount >= kStreamComponents) break;
+                    TeletextContent& t = info->teletext[info->teletextCount++];
+                    t.pid = c.pid;
+                    t.type = page.type;
+                    copyText(t.langCode, c.language);
+                    t.magazineNumber = page.magazine;
+                    t.pageNumber = page.page;
+                    t.componetTag = c.componentTag;
+                    copyText(t.streamName, c.name);
+                }
+                break;
+            case dvbmodel::Kind::Data:
+                break;
+        }
+    }
+    info->pcrPid = svc.pcrPid;
+    for (size_t i = 0; i < 3 && i < svc.caSystems.size(); ++i) info->caSysId[i] = svc.caSystems[i];
+    return kOk;
+}
+
+int32_t ReceiverStrm::GetAllEvent(int32_t handle, EpgEvent* present, EpgEvent* following,
+                                  ExtEpgEvent* presentExt, ExtEpgEvent* followingExt) {
+    std::lock_guard<std::mutex> lock(mRx->mLock);
+    if (present == nullptr || following == nullptr || presentExt == nullptr ||
+        followingExt == nullptr)
+        return kErrBadParameter;
+    auto it = mRx->streams.find(handle);
+    if (it == mRx->streams.end()) return kErrBadHandle;
+    if (!it->second.started) return kErrNotStarted;
+    int64_t seconds = mRx->clock().nowSeconds();
+    const dvbmodel::Service& svc = *it->second.service;
+    // EN 300 468 running status: 4 running, 1 not running.
+    if (const auto* ev = Receiver::eventAt(svc, seconds)) fillEvent(*ev, 4, present, presentExt);
+    if (const auto* ev = Receiver::eventAfter(svc, seconds))
+        fillEvent(*ev, 1, following, followingExt);
+    return kOk;
+}
+
+int32_t ReceiverStrm::GetEvent(int32_t handle, EpgEvent* event) {
+    std::lock_guard<std::mutex> lock(mRx->mLock);
+    if (event == nullptr) return kErrBadParameter;
+    auto it = mRx->streams.find(handle);
+    if (it == mRx->streams.end()) return kErrBadHandle;
+    if (!it->second.started) return kErrNotStarted;
+    const auto* ev = Receiver::eventAt(*it->second.service, mRx->clock().nowSeconds());
+    if (ev == nullptr) return kErrNoData;
+    fillEvent(*ev, 4, event, nullptr);
+    return kOk;
+}
+
+int32_t ReceiverStrm::GetTime(int32_t handle, uint32_t* time) {
+    std::lock_guard<std::mutex> lock(mRx->mLock);
+    if (time == nullptr) return kErrBadParameter;
+    if (mRx->streams.count(handle) == 0) return kErrBadHandle;
+    *time = static_cast<uint32_t>(mRx->clock().nowSeconds());
+    return kOk;
+}
+
+int32_t ReceiverStrm::CheckService(const ServiceCheck* check) {
+    std::lock_guard<std::mutex> lock(mRx->mLock);
+    if (check == nullptr) return kErrBadParameter;
+    for (const auto& net : mRx->broadcast().networks) {
+        for (const auto& tp : net.transports) {
+            const dvbmodel::Tuning& t = tp.tuning;
+            if (tp.tsid != check->tsid || std::llabs(int64_t{check->freq} - t.frequencyKHz) >
+                                                  Receiver::toleranceKHz(t.delivery))
+                continue;
+            if (t.delivery == dvbmodel::Delivery::Satellite &&
+                std::abs(check->satPosition - t.orbitalPosition) > 3)
+                continue;
+            for (const auto& svc : tp.services) {
+                if (svc.id == check->sid) return kOk;
+            }
+        }
+    }
+    return kErrNoService;
+}
+
+int32_t ReceiverStrm::EPG_GetEvent(const EpgSvc* service, int32_t handle, EpgEvent* event,
+                                   ExtEpgEvent* ext) {
+    std::lock_guard<std::mutex> lock(mRx->mLock);
+    if (service == nullptr || event == nullptr || ext == nullptr) return kErrBadParameter;
+    if (mRx->streams.count(handle) == 0) return kErrBadHandle;
+    const auto* svc = mRx->findService(service->onId, service->tsId, service->svcId);
+    if (svc == nullptr) return kErrNoService;
+    int64_t seconds = mRx->clock().nowSeconds();
+    const auto* ev = Receiver::eventAt(*svc, seconds);
+    uint8_t running = 4;
+    if (ev == nullptr) {
+        ev = Receiver::eventAfter(*svc, seconds);
+        running = 1;
+    }
+    if (ev == nullptr) return kErrNoData;
+    fillEvent(*ev, running, event, ext);
+    return kOk;
+}
+
+int32_t ReceiverStrm::EpgMd_AddService(const EpgSvc* service) {
+    std::lock_guard<std::mutex> lock(mRx->mLock);
+    if (service == nullptr) return kErrBadParameter;
+    if (mRx->findService(service->onId, service->tsId, service->svcId) == nullptr)
+        return kErrNoService;
+    auto& list = mRx->epgServices;
+    for (const EpgSvc& e : list) {
+        if (e.svcId == service->svcId && e.tsId == service->tsId && e.onId == service->onId)
+            return kOk;
+    }
+    if (list.size() >= kMaxEpgServices) return kErrTooMany;
+    list.push_back(*service);
+    return kOk;
+}
+
+int32_t ReceiverStrm::EpgMd_ClearService() {
+    std::lock_guard<std::mutex> lock(mRx->mLock);
+    mRx->epgServices.clear();
+    return kOk;
+}
+
+}  // namespace dvbrx
