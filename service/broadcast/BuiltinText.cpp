@@ -1,78 +1,24 @@
-// Texts of the built-in broadcast: the encoder into the broadcast character tables (glibc
-// iconv), the language codes and the subtitle lines.
-#include <errno.h>
-#include <iconv.h>
-
-#include <algorithm>
-#include <memory>
-
+// Texts of the built-in broadcast: the character table of each kind of name and text, the
+// language codes and the subtitle lines.
 #include "broadcast/BuiltinParts.h"
+#include "broadcast/DvbText.h"
 
 namespace dvbmodel::builtin {
 
-namespace {
-
-struct Table {
-    const char* iconvName;
-    std::string_view selector;
-};
-
-Table tableOf(Charset table) {
-    using namespace std::string_view_literals;
+std::string encodeText(Charset table, std::string_view utf8) {
     switch (table) {
         case Charset::Greek:
-            return {"ISO-8859-7", "\x03"sv};
+            return dvbmodel::encodeText(utf8, TextTable::Iso8859_7);
         case Charset::Turkish:
-            return {"ISO-8859-9", "\x05"sv};
+            return dvbmodel::encodeText(utf8, TextTable::Iso8859_9);
         case Charset::Central:
-            return {"ISO-8859-2", "\x10\x00\x02"sv};
+            return dvbmodel::encodeText(utf8, TextTable::Iso8859_2);
         case Charset::Utf8:
-            return {"UTF-8", "\x15"sv};
+            return dvbmodel::encodeText(utf8, TextTable::Utf8);
         case Charset::Latin:
             break;
     }
-    return {"ISO6937", {}};
-}
-
-// Length of the UTF-8 sequence that starts with `lead`, at least 1.
-size_t sequenceLength(unsigned char lead) {
-    if (lead >= 0xF0) return 4;
-    if (lead >= 0xE0) return 3;
-    if (lead >= 0xC0) return 2;
-    return 1;
-}
-
-}  // namespace
-
-std::string encodeText(Charset table, std::string_view utf8) {
-    const Table t = tableOf(table);
-    std::string out(t.selector);
-    if (table == Charset::Utf8) return out.append(utf8);
-    iconv_t cd = iconv_open(t.iconvName, "UTF-8");
-    if (cd == reinterpret_cast<iconv_t>(-1)) return out.append(utf8.size(), '?');
-    std::unique_ptr<void, int (*)(iconv_t)> closer(cd, iconv_close);
-    // ISO 6937 spends two bytes on an accented letter; no table here spends more than that
-    // on a character that takes one or more bytes in UTF-8.
-    char buffer[2];
-    auto* in = const_cast<char*>(utf8.data());
-    size_t inLeft = utf8.size();
-    while (inLeft > 0) {
-        char* outPtr = buffer;
-        size_t outLeft = sizeof buffer;
-        // One character at a time, so that a character the table lacks costs only itself.
-        size_t length = std::min(sequenceLength(static_cast<unsigned char>(*in)), inLeft);
-        size_t charLeft = length;
-        if (iconv(cd, &in, &charLeft, &outPtr, &outLeft) == static_cast<size_t>(-1)) {
-            iconv(cd, nullptr, nullptr, nullptr, nullptr);
-            out.push_back('?');
-            in += charLeft;
-            inLeft -= length;
-            continue;
-        }
-        out.append(buffer, static_cast<size_t>(outPtr - buffer));
-        inLeft -= length;
-    }
-    return out;
+    return dvbmodel::encodeText(utf8, TextTable::Iso6937);
 }
 
 const char* languageCode(Language language) {

@@ -1,5 +1,7 @@
 #include "Receiver.h"
 
+#include "broadcast/Builtin.h"
+
 #include <android_runtime/AndroidRuntime.h>
 
 #include <algorithm>
@@ -429,7 +431,7 @@ std::string epgDatabasePath() {
 }
 
 dvbmodel::Broadcast defaultBroadcast(int64_t start) {
-    return fallbackBroadcast(start);
+    return dvbmodel::builtinBroadcast(start);
 }
 
 namespace {
