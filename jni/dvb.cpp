@@ -102,13 +102,6 @@ void JNIDVBListener::notify(int msg, int ext1, int ext2, const android::Parcel*)
 
 namespace {
 
-// Replaces the NoClassDefFoundError or NoSuchFieldError that a failed look-up left pending
-// with the library's own RuntimeException (throwing over it would log a warning).
-void throwRuntime(JNIEnv* env, const char* message) {
-    env->ExceptionClear();
-    jniThrowException(env, "java/lang/RuntimeException", message);
-}
-
 // Stores `dvb` in thiz's mNativeContext and returns the object that was there before. The
 // Java object holds one strong reference, with itself as the reference ID. `*bound` tells
 // whether `dvb` got a context: only a 64-bit build can run out of them (4096 bound objects).
@@ -139,18 +132,18 @@ void DVB_native_init(JNIEnv* env, jclass) {
     __android_log_print(ANDROID_LOG_VERBOSE, kTag, "android_dvb_DVB_native_init was called");
     ScopedLocalRef<jclass> cls(env, env->FindClass("android/DVB/DVB"));
     if (cls.get() == nullptr) {
-        throwRuntime(env, "Can't find android/DVB/DVB");
+        dvbjni::throwRuntime(env, "Can't find android/DVB/DVB");
         return;
     }
     gFields.context = env->GetFieldID(cls.get(), "mNativeContext", "I");
     if (gFields.context == nullptr) {
-        throwRuntime(env, "Can't find DVB.mNativeContext");
+        dvbjni::throwRuntime(env, "Can't find DVB.mNativeContext");
         return;
     }
     gFields.postEvent = env->GetStaticMethodID(cls.get(), "postEventFromNative",
                                                "(Ljava/lang/Object;IIILjava/lang/Object;)V");
     if (gFields.postEvent == nullptr) {
-        throwRuntime(env, "Can't find DVB.postEventFromNative");
+        dvbjni::throwRuntime(env, "Can't find DVB.postEventFromNative");
     }
 }
 
@@ -195,25 +188,6 @@ const JNINativeMethod gMethods[] = {
 };
 
 }  // namespace
-
-namespace dvbjni {
-
-bool findContextField(JNIEnv* env, const char* className, const char* classMessage,
-                      const char* fieldMessage, jfieldID* contextField) {
-    ScopedLocalRef<jclass> cls(env, env->FindClass(className));
-    if (cls.get() == nullptr) {
-        throwRuntime(env, classMessage);
-        return false;
-    }
-    *contextField = env->GetFieldID(cls.get(), "mNativeContext", "I");
-    if (*contextField == nullptr) {
-        throwRuntime(env, fieldMessage);
-        return false;
-    }
-    return true;
-}
-
-}  // namespace dvbjni
 
 jint JNI_OnLoad(JavaVM* vm, void* /* reserved */) {
     JNIEnv* env = nullptr;

@@ -8,6 +8,11 @@
 
 namespace dvbjni {
 
+void throwRuntime(JNIEnv* env, const char* message) {
+    env->ExceptionClear();
+    jniThrowException(env, "java/lang/RuntimeException", message);
+}
+
 void throwNoModule(JNIEnv* env) {
     jniThrowException(env, "java/lang/IllegalStateException", nullptr);
 }

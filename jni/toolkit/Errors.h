@@ -9,6 +9,11 @@
 
 namespace dvbjni {
 
+// Replaces the NoClassDefFoundError or NoSuchFieldError that a failed look-up at load or
+// set-up left pending with the library's own RuntimeException (throwing over it would make
+// the VM warn).
+void throwRuntime(JNIEnv* env, const char* message);
+
 // No DVB object bound, or it has no such module.
 void throwNoModule(JNIEnv* env);
 
