@@ -779,15 +779,22 @@ std::vector<uint8_t> encodeDisplaySet(const DisplaySet& set, uint16_t pageId, ui
         at = openSegment(out, kClutDefinition, pageId);
         out.push_back(c.id);
         out.push_back(static_cast<uint8_t>((c.version & 15) << 4));
-        for (uint8_t i = 0; i < 4; ++i) {
-            if (!same(c.c2[i], standard.c2[i])) encodeClut(out, 0x80, i, c.c2[i]);
-        }
-        for (uint8_t i = 0; i < 16; ++i) {
-            if (!same(c.c4[i], standard.c4[i])) encodeClut(out, 0x40, i, c.c4[i]);
-        }
-        for (size_t i = 0; i < 256; ++i) {
-            if (!same(c.c8[i], standard.c8[i])) {
-                encodeClut(out, 0x20, static_cast<uint8_t>(i), c.c8[i]);
+        // The tables that regions use go whole, so that no decoder falls back on its own idea
+        // of the default entries; of the others, what differs from the default.
+        auto used = [&set, &c](uint8_t depth) {
+            return std::any_of(set.regions.begin(), set.regions.end(), [&](const Region& r) {
+                return r.clutId == c.id && r.depth == depth;
+            });
+        };
+        const ClutEntry* tables[3] = {c.c2.data(), c.c4.data(), c.c8.data()};
+        const ClutEntry* defaults[3] = {standard.c2.data(), standard.c4.data(), standard.c8.data()};
+        for (int t = 0; t < 3; ++t) {
+            bool whole = used(static_cast<uint8_t>(t + 1));
+            for (size_t i = 0; i < (t == 0 ? 4u : t == 1 ? 16u : 256u); ++i) {
+                if (whole || !same(tables[t][i], defaults[t][i])) {
+                    encodeClut(out, static_cast<uint8_t>(0x80 >> t), static_cast<uint8_t>(i),
+                               tables[t][i]);
+                }
             }
         }
         fits &= closeSegment(out, at);

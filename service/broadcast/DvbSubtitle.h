@@ -95,8 +95,10 @@ private:
 // (0, 0) and covering it, run-length coded in the region's depth, both fields. That object
 // takes the id of a bitmap object the region places at (0, 0), or else 0xFF00 + the region
 // id; the region's other object placements are not written (their pixels are in the
-// region's). CLUT entries that differ from the default CLUT are written, each in the reduced
-// range where that keeps its value exactly, in the full range otherwise.
+// region's). A CLUT's tables that its regions use are written whole, of its other tables the
+// entries that differ from the default CLUT; each entry in the reduced range where that keeps
+// its value exactly, in the full range otherwise. A display set that does not fit (a segment
+// or the PES over 65535 bytes) gives an empty result.
 std::vector<uint8_t> encodeDisplaySet(const DisplaySet& set, uint16_t pageId, uint64_t pts);
 
 // The PES packets of one PID, reassembled from 188-byte transport packets. A packet lost on

@@ -21,11 +21,6 @@ namespace {
 
 using Packets = std::vector<std::vector<uint8_t>>;
 
-std::vector<uint8_t> readFile(const std::string& path) {
-    std::ifstream in(path, std::ios::binary);
-    return {std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
-}
-
 std::vector<DisplaySet> decode(DvbSubtitleDecoder& d, const Packets& pes) {
     std::vector<DisplaySet> out;
     for (const auto& p : pes) d.feed(p.data(), p.size(), out);
@@ -33,7 +28,8 @@ std::vector<DisplaySet> decode(DvbSubtitleDecoder& d, const Packets& pes) {
 }
 
 Packets capture(const char* name, uint16_t pid) {
-    std::vector<uint8_t> ts = readFile(std::string(DVB_TESTDATA_DIR) + "/" + name);
+    std::ifstream in(std::string(DVB_TESTDATA_DIR) + "/" + name, std::ios::binary);
+    std::vector<uint8_t> ts{std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
     Packets pes;
     PesAssembler a(pid);
     a.feed(ts.data(), ts.size(), pes);
@@ -71,14 +67,14 @@ std::vector<uint32_t> compose(const DisplaySet& s) {
     return canvas;
 }
 
-std::vector<uint32_t> readPng(const std::string& path, uint32_t& width, uint32_t& height) {
+// A PNG's pixels as ARGB, row by row; none when it cannot be read.
+std::vector<uint32_t> readPng(const std::string& path) {
     png_image image{};
     image.version = PNG_IMAGE_VERSION;
     if (!png_image_begin_read_from_file(&image, path.c_str())) return {};
     image.format = PNG_FORMAT_ARGB;
     std::vector<uint8_t> bytes(PNG_IMAGE_SIZE(image));
     if (!png_image_finish_read(&image, nullptr, bytes.data(), 0, nullptr)) return {};
-    width = image.width, height = image.height;
     std::vector<uint32_t> argb(bytes.size() / 4);
     for (size_t i = 0; i < argb.size(); ++i) {
         argb[i] = uint32_t{bytes[4 * i]} << 24 | bytes[4 * i + 1] << 16 | bytes[4 * i + 2] << 8 |
@@ -104,41 +100,26 @@ size_t differences(const std::vector<uint32_t>& a, const std::vector<uint32_t>& 
     return count;
 }
 
-void expectSame(const DisplaySet& a, const DisplaySet& b) {
-    EXPECT_EQ(a.pageId, b.pageId);
-    EXPECT_EQ(a.timeout * 1000 + a.version * 10 + a.state,
-              b.timeout * 1000 + b.version * 10 + b.state);
-    ASSERT_EQ(a.placements.size(), b.placements.size());
-    for (size_t i = 0; i < a.placements.size(); ++i) {
-        EXPECT_EQ(a.placements[i].id, b.placements[i].id);
-        EXPECT_EQ(a.placements[i].x * 65536 + a.placements[i].y,
-                  b.placements[i].x * 65536 + b.placements[i].y);
+// Every field of a display set that travels in segments, in one row of numbers.
+std::vector<int> flat(const DisplaySet& s) {
+    std::vector<int> v = {s.pageId,     s.timeout,        s.version,      s.state,
+                          s.hasDisplay, s.displayVersion, s.displayWidth, s.displayHeight,
+                          s.windowed,   s.windowX,        s.windowY,      s.windowMaxX,
+                          s.windowMaxY};
+    for (const RegionRef& p : s.placements) v.insert(v.end(), {-1, p.id, p.x, p.y});
+    for (const Region& r : s.regions) {
+        v.insert(v.end(), {-2, r.id, r.version, r.width, r.height, r.depth, r.clutId, r.fill,
+                           r.background8, r.background4, r.background2});
+        v.insert(v.end(), r.pixels.begin(), r.pixels.end());
+        for (const ObjectRef& o : r.objects) v.insert(v.end(), {-3, o.id, o.type, o.x, o.y});
     }
-    ASSERT_EQ(a.regions.size(), b.regions.size());
-    for (size_t i = 0; i < a.regions.size(); ++i) {
-        const Region &r = a.regions[i], &q = b.regions[i];
-        EXPECT_EQ(std::vector<int>({r.id, r.version, r.width, r.height, r.depth, r.clutId, r.fill,
-                                    r.background8, r.background4, r.background2}),
-                  std::vector<int>({q.id, q.version, q.width, q.height, q.depth, q.clutId, q.fill,
-                                    q.background8, q.background4, q.background2}));
-        EXPECT_EQ(r.pixels, q.pixels) << "region " << int(r.id);
-        ASSERT_EQ(r.objects.size(), q.objects.size());
-        for (size_t k = 0; k < r.objects.size(); ++k) EXPECT_EQ(r.objects[k].id, q.objects[k].id);
+    for (const Clut& c : s.cluts) {
+        v.insert(v.end(), {-4, c.id, c.version});
+        for (const auto& e : c.c2) v.insert(v.end(), {e.y, e.cr, e.cb, e.t});
+        for (const auto& e : c.c4) v.insert(v.end(), {e.y, e.cr, e.cb, e.t});
+        for (const auto& e : c.c8) v.insert(v.end(), {e.y, e.cr, e.cb, e.t});
     }
-    ASSERT_EQ(a.cluts.size(), b.cluts.size());
-    auto bytes = [](const Clut& c) {
-        std::vector<uint8_t> v = {c.id, c.version};
-        for (const auto* t : {c.c2.data(), c.c4.data(), c.c8.data()}) {
-            size_t n = t == c.c2.data() ? 4 : t == c.c4.data() ? 16 : 256;
-            for (size_t i = 0; i < n; ++i) v.insert(v.end(), {t[i].y, t[i].cr, t[i].cb, t[i].t});
-        }
-        return v;
-    };
-    for (size_t i = 0; i < a.cluts.size(); ++i) EXPECT_EQ(bytes(a.cluts[i]), bytes(b.cluts[i]));
-    EXPECT_EQ(std::vector<int>({a.hasDisplay, a.displayVersion, a.displayWidth, a.displayHeight,
-                                a.windowed, a.windowX, a.windowY, a.windowMaxX, a.windowMaxY}),
-              std::vector<int>({b.hasDisplay, b.displayVersion, b.displayWidth, b.displayHeight,
-                                b.windowed, b.windowX, b.windowY, b.windowMaxX, b.windowMaxY}));
+    return v;
 }
 
 // Display sets that exercise every code of every depth: runs of every length from 1 to past
@@ -189,19 +170,18 @@ TEST(DvbSubtitle, CanalPlusCaptureMatchesItsTruthAndFfmpegRendering) {
     ASSERT_EQ(sets.size(), 1u);
     const DisplaySet& s = sets[0];
     EXPECT_EQ(s.pts, 5826066156u);
+    ASSERT_EQ(s.placements.size() * 10 + s.regions.size() * 100 + s.cluts.size(), 422u);
     EXPECT_EQ(std::vector<int>({s.pageId, s.state, s.version, s.timeout, s.hasDisplay,
-                                s.displayWidth, s.displayHeight, s.windowed}),
-              std::vector<int>({3, 2, 2, 10, 1, 720, 576, 0}));
-    ASSERT_EQ(s.placements.size(), 2u);
-    EXPECT_EQ(std::vector<int>({s.placements[0].id, s.placements[0].x, s.placements[0].y,
-                                s.placements[1].id, s.placements[1].x, s.placements[1].y}),
-              std::vector<int>({0, 60, 460, 1, 60, 502}));
+                                s.displayWidth, s.displayHeight, s.windowed, s.placements[0].id,
+                                s.placements[0].x, s.placements[0].y, s.placements[1].id,
+                                s.placements[1].x, s.placements[1].y, s.cluts[0].id,
+                                s.cluts[0].version, s.cluts[1].id, s.cluts[1].version}),
+              std::vector<int>({3, 2, 2, 10, 1, 720, 576, 0, 0, 60, 460, 1, 60, 502, 1, 14, 2, 3}));
     // id, width, height, depth (4-bit), CLUT, version, fill, object id, x, y (0: none).
     const int truth[4][10] = {{0, 600, 42, 2, 1, 14, 1, 35439, 182, 0},
                               {1, 600, 42, 2, 2, 14, 1, 35440, 204, 0},
                               {2, 600, 42, 2, 1, 14, 1, 0, 0, 0},
                               {3, 600, 42, 2, 1, 14, 1, 0, 0, 0}};
-    ASSERT_EQ(s.regions.size(), 4u);
     for (size_t i = 0; i < 4; ++i) {
         const Region& r = s.regions[i];
         const ObjectRef o = r.objects.empty() ? ObjectRef{} : r.objects[0];
@@ -210,19 +190,14 @@ TEST(DvbSubtitle, CanalPlusCaptureMatchesItsTruthAndFfmpegRendering) {
                   std::vector<int>(truth[i], truth[i] + 10));
         EXPECT_EQ(r.objects.size(), truth[i][7] ? 1u : 0u);
     }
-    ASSERT_EQ(s.cluts.size(), 2u);
-    EXPECT_EQ(s.cluts[0].id * 100 + s.cluts[0].version, 114);
-    EXPECT_EQ(s.cluts[1].id * 100 + s.cluts[1].version, 203);
-    EXPECT_EQ(decoder.stats().segments, 11u);
-    EXPECT_EQ(decoder.stats().segmentsDropped + decoder.stats().objectsDropped +
-                      decoder.stats().runsClipped + decoder.stats().missingCluts,
+    const DvbSubtitleStats& stats = decoder.stats();
+    EXPECT_EQ(stats.segments, 11u);
+    EXPECT_EQ(stats.segmentsDropped + stats.objectsDropped + stats.runsClipped + stats.missingCluts,
               0u);
 
-    uint32_t width = 0, height = 0;
     std::vector<uint32_t> ffmpeg =
-            readPng(DVB_TESTDATA_DIR "/truth/dvbsub-canalplus-cinema.pid0157.set1.ffmpeg.png",
-                    width, height);
-    ASSERT_EQ(width * 10000 + height, 720u * 10000 + 576u);
+            readPng(DVB_TESTDATA_DIR "/truth/dvbsub-canalplus-cinema.pid0157.set1.ffmpeg.png");
+    ASSERT_EQ(ffmpeg.size(), 720u * 576u);
     std::vector<uint32_t> ours = compose(s);
     // ffmpeg converts Y, Cr, Cb by its own rounded fixed-point BT.601, not by the truncated
     // one of the CLUT readers: 2538 pixels of this set differ by 1 in a channel, none by more.
@@ -236,32 +211,25 @@ TEST(DvbSubtitle, DamagedCaptureKeepsItsSoundParts) {
     DvbSubtitleDecoder decoder(2, 2);
     std::vector<DisplaySet> sets = decode(decoder, capture("damaged-subtitles-teletext.ts", 0x4B));
     ASSERT_EQ(sets.size(), 2u);
-    EXPECT_EQ(sets[0].pts, 5115973396u);
-    EXPECT_EQ(std::vector<int>({sets[0].state, sets[0].timeout, sets[0].version}),
-              std::vector<int>({0, 30, 3}));
-    EXPECT_TRUE(sets[0].placements.empty());
     const DisplaySet& s = sets[1];
-    EXPECT_EQ(s.pts, 8337209663u);
-    ASSERT_EQ(s.placements.size(), 1u);
-    EXPECT_EQ(s.placements[0].y, 510);
-    ASSERT_EQ(s.regions.size(), 1u);
+    ASSERT_EQ(s.placements.size() * 10 + s.regions.size(), 11u);
     const Region& r = s.regions[0];
-    EXPECT_EQ(std::vector<int>({r.width, r.height, r.depth, r.clutId, r.objects.at(0).x}),
-              std::vector<int>({720, 42, 2, 0, 190}));
+    EXPECT_EQ(std::vector<int64_t>({int64_t(sets[0].pts), sets[0].state, sets[0].timeout,
+                                    sets[0].version, int64_t(sets[0].placements.size()),
+                                    int64_t(s.pts), s.placements[0].y, r.width, r.height, r.depth,
+                                    r.clutId, r.objects.at(0).x}),
+              std::vector<int64_t>({5115973396, 0, 30, 3, 0, 8337209663, 510, 720, 42, 2, 0, 190}));
     // The CLUT that reads as object data 32 is dropped, so CLUT 0 is missing: the region is
     // shown with the default CLUT; its object (0) is drawn right of x 190.
     EXPECT_TRUE(s.cluts.empty());
-    EXPECT_EQ(decoder.stats().objectsDropped, 1u);
-    EXPECT_EQ(decoder.stats().missingCluts, 1u);
-    size_t drawn = 0;
-    for (int y = 0; y < r.height; ++y) {
-        for (int x = 0; x < r.width; ++x) {
-            if (r.pixels[size_t(y) * r.width + x] == 0) continue;
-            ++drawn;
-            EXPECT_GE(x, 190);
-        }
+    EXPECT_EQ(decoder.stats().objectsDropped * 10 + decoder.stats().missingCluts, 11u);
+    size_t drawn = 0, misplaced = 0;
+    for (size_t i = 0; i < r.pixels.size(); ++i) {
+        drawn += r.pixels[i] != 0;
+        misplaced += r.pixels[i] != 0 && i % r.width < 190;
     }
     EXPECT_GT(drawn, 1000u);
+    EXPECT_EQ(misplaced, 0u);
 }
 
 TEST(DvbSubtitle, RoundTripThroughTheEncoder) {
@@ -271,7 +239,7 @@ TEST(DvbSubtitle, RoundTripThroughTheEncoder) {
     std::vector<DisplaySet> out = decode(decoder, {pes});
     ASSERT_EQ(out.size(), 1u);
     EXPECT_EQ(out[0].pts, 0x1ABCDEF01ull);
-    expectSame(out[0], s);
+    EXPECT_TRUE(flat(out[0]) == flat(s));
     EXPECT_EQ(decoder.stats().segments, 2u + 3 + 2 + 3 + 1);
 
     // A normal case with unchanged versions is not applied again; new versions are.
@@ -282,12 +250,12 @@ TEST(DvbSubtitle, RoundTripThroughTheEncoder) {
     update.cluts[1].c4[5] = ClutEntry{80, 90, 100, 0};
     out = decode(decoder, {encodeDisplaySet(update, 3, 1)});
     ASSERT_EQ(out.size(), 1u);
-    expectSame(out[0], s);
+    EXPECT_TRUE(flat(out[0]) == flat(s));
     update.version = 6, update.regions[0].version = 1, update.cluts[1].version = 0;
     out = decode(decoder, {encodeDisplaySet(update, 3, 2)});
     ASSERT_EQ(out.size(), 1u);
     update.state = 0;
-    expectSame(out[0], update);
+    EXPECT_TRUE(flat(out[0]) == flat(update));
 }
 
 // Damage made on purpose, each from an encoded display set: what is sound stays.
@@ -373,9 +341,9 @@ TEST(DvbSubtitle, FfmpegRendersTheEncodedDisplaySet) {
     fs::create_directories(dir);
     std::vector<uint8_t> ts;
     section(ts, 0, {0x00, 0, 0, 0, 1, 0xC1, 0, 0, 0, 1, 0xE1, 0x00});
-    section(ts, 0x100,
-            {0x02, 0,    0,    0,    1,    0xC1, 0,   0,   0xE1, 0x01, 0xF0, 0x00, 0x06, 0xE1,
-             0x01, 0xF0, 0x0A, 0x59, 0x08, 'f',  'r', 'a', 0x10, 0,    3,    0,    4});
+    // PMT: PCR and subtitles on PID 0x101, subtitling descriptor "fra", pages 3 and 4.
+    section(ts, 0x100, {0x02, 0,    0,  0,    1, 0xC1, 0,   0,   0xE1, 1, 0xF0, 0, 6, 0xE1,
+                        1,    0xF0, 10, 0x59, 8, 'f',  'r', 'a', 0x10, 0, 3,    0, 4});
     const DisplaySet s = sample();
     DisplaySet clear;
     clear.state = 0, clear.version = 6;
@@ -392,13 +360,9 @@ TEST(DvbSubtitle, FfmpegRendersTheEncodedDisplaySet) {
     size_t frames = 0, matched = 0;
     for (const auto& f : fs::directory_iterator(dir)) {
         if (f.path().extension() != ".png") continue;
-        uint32_t width = 0, height = 0;
-        std::vector<uint32_t> theirs = readPng(f.path().string(), width, height);
         ++frames;
-        // Same rule as for the capture: ffmpeg's own rounding, at most 2 per channel.
-        std::fprintf(stderr, "%s %u %u %zu\n", f.path().c_str(), width, height,
-                     differences(ours, theirs, 2));
-        if (width == 720 && height == 576 && differences(ours, theirs, 2) == 0) ++matched;
+        // Same rule as for the capture: ffmpeg's own rounding, at most 1 per channel.
+        matched += differences(ours, readPng(f.path().string()), 1) == 0;
     }
     fs::remove_all(dir);
     // The display set, repeated by the frame-rate conversion, between empty frames.
