@@ -748,6 +748,7 @@ std::vector<uint8_t> encodeDisplaySet(const DisplaySet& set, uint16_t pageId, ui
     std::vector<uint16_t> carriers;
     for (const Region& r : set.regions) {
         uint16_t id = static_cast<uint16_t>(0xFF00 | r.id);
+        while (std::find(carriers.begin(), carriers.end(), id) != carriers.end()) ++id;
         for (const ObjectRef& o : r.objects) {
             if (o.type == 0 && o.x == 0 && o.y == 0 &&
                 std::find(carriers.begin(), carriers.end(), o.id) == carriers.end()) {
