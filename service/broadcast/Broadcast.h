@@ -120,6 +120,7 @@ struct ObjectRef {
     uint8_t type = 0;  // 0 bitmap, 1 character, 2 string of characters
     uint16_t x = 0, y = 0;
     uint8_t foreground = 0, background = 0;
+    std::vector<uint16_t> text;  // character objects: the codes their object data carried
 };
 
 struct Region {
@@ -127,6 +128,8 @@ struct Region {
     uint16_t width = 0, height = 0;
     uint8_t levelOfCompatibility = 1, depth = 2;  // EN 300 743 codes: depth 1 = 2 bit, 2 = 4, 3 = 8
     uint8_t clutId = 0;
+    bool fill = false;  // filled with the background code of its depth when composed
+    uint8_t background8 = 0, background4 = 0, background2 = 0;
     std::vector<uint8_t> pixels;  // width * height CLUT indexes, row by row
     std::vector<ObjectRef> objects;
 };
@@ -139,11 +142,14 @@ struct RegionRef {
 // A complete subtitle display set as a decoder holds it after its end-of-display-set segment.
 struct DisplaySet {
     int64_t time = 0;     // milliseconds from the start of the broadcast's loop
-    uint16_t pageId = 0;  // composition page id (16 bits, as the component announces it)
-    uint8_t timeout = 0, version = 0, state = 0;  // page composition
+    uint64_t pts = 0;     // 90 kHz presentation time stamp (33 bits) where a stream gave one
+    uint16_t pageId = 0;  // composition page id
+    // Page composition: time-out in seconds, version, state (0 normal case, 1 acquisition
+    // point, 2 mode change).
+    uint8_t timeout = 0, version = 0, state = 0;
     std::vector<RegionRef> placements;
-    std::vector<Region> regions;
-    std::vector<Clut> cluts;
+    std::vector<Region> regions;  // every region of the epoch, placed on the page or not
+    std::vector<Clut> cluts;      // the CLUTs that the epoch defined (others: the default CLUT)
     bool hasDisplay = false;
     uint8_t displayVersion = 0;
     uint16_t displayWidth = 720, displayHeight = 576;

@@ -150,7 +150,11 @@ Region lineRegion(Renderer& renderer, std::string_view text, uint8_t id, uint8_t
     r.pixels.resize(coverage.size());
     std::transform(coverage.begin(), coverage.end(), r.pixels.begin(),
                    [top](uint8_t c) { return static_cast<uint8_t>(1 + (c * top + 127) / 255); });
-    r.objects.push_back({id, 0, 0, 0, static_cast<uint8_t>(top + 1), 1});
+    ObjectRef object;  // one bitmap object covering the region
+    object.id = id;
+    object.foreground = static_cast<uint8_t>(top + 1);
+    object.background = 1;
+    r.objects.push_back(object);
     return r;
 }
 
