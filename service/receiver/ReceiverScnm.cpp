@@ -7,6 +7,7 @@
 #include <set>
 
 #include "Modules.h"
+#include "broadcast/DvbText.h"
 
 namespace dvbrx {
 namespace {
@@ -116,8 +117,15 @@ private:
 
 template <size_t N>
 void copyText(char (&field)[N], const std::string& text) {
-    size_t n = std::min(text.size(), N - 1);
-    memcpy(field, text.data(), n);
+    // A name whose bytes hold a zero (UCS-2, the 0x10 0x00 NN selectors) cannot travel in a
+    // zero-ended field as broadcast: it goes as UTF-8 behind that table's selector, 0x15. Either
+    // way it is cut at a whole character.
+    std::string bytes =
+            text.find('\0') == std::string::npos
+                    ? text
+                    : dvbmodel::encodeText(dvbmodel::decodeText(text), dvbmodel::TextTable::Utf8);
+    size_t n = dvbmodel::fitText(bytes, N - 1);
+    memcpy(field, bytes.data(), n);
     field[n] = '\0';
 }
 
