@@ -5,11 +5,38 @@
 
 #include <DVB.h>
 
+#include <cstring>
 #include <memory>
+#include <string>
 
 #include "Receiver.h"
+#include "broadcast/DvbText.h"
 
 namespace dvbrx {
+
+// Broadcast text into a zero-ended record field that reaches Java as bytes (names and short
+// event texts): the broadcast bytes, cut at a whole character. Text whose table puts zero bytes
+// in it (UCS-2, the 0x10 0x00 NN selectors) goes as UTF-8 behind that table's selector, 0x15.
+template <size_t N>
+void copyBroadcastText(char (&field)[N], const std::string& text) {
+    std::string bytes =
+            text.find('\0') == std::string::npos
+                    ? text
+                    : dvbmodel::encodeText(dvbmodel::decodeText(text), dvbmodel::TextTable::Utf8);
+    size_t n = dvbmodel::fitText(bytes, N - 1);
+    memcpy(field, bytes.data(), n);
+    field[n] = '\0';
+}
+
+// Broadcast text into a field that reaches Java as a string (extended texts and items, track
+// names): decoded to UTF-8, cut at a whole character.
+template <size_t N>
+void copyDisplayText(char (&field)[N], const std::string& text) {
+    std::string utf8 = dvbmodel::decodeText(text);
+    size_t n = dvbmodel::fitUtf8(utf8, N - 1);
+    memcpy(field, utf8.data(), n);
+    field[n] = '\0';
+}
 
 class ReceiverScnm : public android::Scnm {
 public:

@@ -7,7 +7,6 @@
 #include <set>
 
 #include "Modules.h"
-#include "broadcast/DvbText.h"
 
 namespace dvbrx {
 namespace {
@@ -115,20 +114,6 @@ private:
     std::set<const dvbmodel::Transport*> mFound;
 };
 
-template <size_t N>
-void copyText(char (&field)[N], const std::string& text) {
-    // A name whose bytes hold a zero (UCS-2, the 0x10 0x00 NN selectors) cannot travel in a
-    // zero-ended field as broadcast: it goes as UTF-8 behind that table's selector, 0x15. Either
-    // way it is cut at a whole character.
-    std::string bytes =
-            text.find('\0') == std::string::npos
-                    ? text
-                    : dvbmodel::encodeText(dvbmodel::decodeText(text), dvbmodel::TextTable::Utf8);
-    size_t n = dvbmodel::fitText(bytes, N - 1);
-    memcpy(field, bytes.data(), n);
-    field[n] = '\0';
-}
-
 void fillService(SCNM_ServiceInfo& node, const dvbmodel::Transport& tp,
                  const dvbmodel::Service& svc, int64_t seconds) {
     node.svcType = svc.type;
@@ -146,7 +131,7 @@ void fillService(SCNM_ServiceInfo& node, const dvbmodel::Transport& tp,
     node.pmtPid = svc.pmtPid;
     uint16_t* ca[] = {&node.caSysId0, &node.caSysId1, &node.caSysId2};
     for (size_t i = 0; i < 3 && i < svc.caSystems.size(); ++i) *ca[i] = svc.caSystems[i];
-    copyText(node.svcName, svc.name);
+    copyBroadcastText(node.svcName, svc.name);
     node.tsId = tp.tsid;
     node.onId = tp.onid;
     node.lcn = svc.lcn;

@@ -15,13 +15,6 @@ constexpr int64_t kTvBitRate = 4000000, kRadioBitRate = 192000;
 // Services the event collection keeps at most.
 constexpr size_t kMaxEpgServices = 1024;
 
-template <size_t N>
-void copyText(char (&field)[N], const std::string& text) {
-    size_t n = std::min(text.size(), N - 1);
-    memcpy(field, text.data(), n);
-    field[n] = '\0';
-}
-
 void fillEvent(const dvbmodel::Event& ev, uint8_t runStatus, EpgEvent* e, ExtEpgEvent* x) {
     e->evtId = ev.id;
     e->startTime = static_cast<int32_t>(ev.start);
@@ -29,17 +22,17 @@ void fillEvent(const dvbmodel::Event& ev, uint8_t runStatus, EpgEvent* e, ExtEpg
     e->runStatus = runStatus;
     e->parentalRating = ev.parentalRating;
     e->content = ev.content;
-    copyText(e->name, ev.name);
-    copyText(e->text, ev.text);
+    copyBroadcastText(e->name, ev.name);
+    copyBroadcastText(e->text, ev.text);
     e->extendedFlag = !ev.extendedText.empty() || !ev.items.empty() ? 1 : 0;
     if (x == nullptr) return;
     size_t n = std::min<size_t>(ev.items.size(), kExtEpgItems);
     x->itemCount = static_cast<uint32_t>(n);
     for (size_t i = 0; i < n; ++i) {
-        copyText(x->items[i].itemDesc, ev.items[i].description);
-        copyText(x->items[i].itemText, ev.items[i].text);
+        copyDisplayText(x->items[i].itemDesc, ev.items[i].description);
+        copyDisplayText(x->items[i].itemText, ev.items[i].text);
     }
-    copyText(x->text, ev.extendedText);
+    copyDisplayText(x->text, ev.extendedText);
 }
 
 const dvbmodel::Component* component(const dvbmodel::Service& svc, dvbmodel::Kind kind,
@@ -243,9 +236,9 @@ int32_t ReceiverStrm::CreatStreamInfo(int32_t handle, STRM_StreamInfo* info) {
                     a.pid = c.pid;
                     a.isDolbyAC3 = c.ac3 || c.eac3 ? 1 : 0;
                     a.type = c.streamType;
-                    copyText(a.langCode0, c.language);
+                    copyDisplayText(a.langCode0, c.language);
                     a.componetTag = c.componentTag;
-                    copyText(a.streamName, c.name);
+                    copyDisplayText(a.streamName, c.name);
                 }
                 break;
             case dvbmodel::Kind::Subtitle:
@@ -253,7 +246,7 @@ int32_t ReceiverStrm::CreatStreamInfo(int32_t handle, STRM_StreamInfo* info) {
                     SubtitleContent& t = info->subtitle[info->subtitleCount++];
                     t.pid = c.pid;
                     t.type = c.subtitlingType;
-                    copyText(t.langCode, c.language);
+                    copyDisplayText(t.langCode, c.language);
                     t.compositionPageId = c.compositionPageId;
                     t.ancillaryPageId = c.ancillaryPageId;
                 }
@@ -265,11 +258,11 @@ int32_t ReceiverStrm::CreatStreamInfo(int32_t handle, STRM_StreamInfo* info) {
                     TeletextContent& t = info->teletext[info->teletextCount++];
                     t.pid = c.pid;
                     t.type = page.type;
-                    copyText(t.langCode, c.language);
+                    copyDisplayText(t.langCode, c.language);
                     t.magazineNumber = page.magazine;
                     t.pageNumber = page.page;
                     t.componetTag = c.componentTag;
-                    copyText(t.streamName, c.name);
+                    copyDisplayText(t.streamName, c.name);
                 }
                 break;
             case dvbmodel::Kind::Data:

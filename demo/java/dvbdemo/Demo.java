@@ -1,39 +1,408 @@
 package dvbdemo;
 
-import android.DVB.Cfg;
 import android.DVB.DVB;
-import java.util.concurrent.CountDownLatch;
+import android.DVB.Scnm;
+import android.DVB.Strm;
+import android.DVB.Subttl;
+import android.DVB.Teltxt;
+import java.awt.image.BufferedImage;
+import java.io.File;
+import java.io.IOException;
+import java.time.Instant;
+import java.time.ZoneOffset;
+import java.time.format.DateTimeFormatter;
+import java.util.ArrayList;
+import java.util.Comparator;
+import java.util.LinkedHashMap;
+import java.util.List;
+import java.util.Map;
+import java.util.concurrent.BlockingQueue;
+import java.util.concurrent.LinkedBlockingQueue;
 import java.util.concurrent.TimeUnit;
+import javax.imageio.ImageIO;
 
 /**
- * Binds a DVB object to the substitute service, tunes a front end, reads its status and prints
- * the events that the service raises.
+ * The whole android.DVB API against the receiver behind it: start-up, a scan of each delivery
+ * system, the channel list, a service played with its status, components and events, its
+ * schedule for tomorrow from the event database, a subtitle display set and a teletext page
+ * written as PNGs, then shut-down. Options: --service NAME-OR-NUMBER, --page NNN, --out DIR.
  */
 public final class Demo {
-    public static void main(String[] args) throws InterruptedException {
-        int wanted = args.length > 0 ? Integer.parseInt(args[0]) : 3;
-        CountDownLatch events = new CountDownLatch(wanted);
-        DVB dvb = new DVB();
-        dvb.setOnEventListener((source, msg, ext1, ext2, obj) -> {
-            System.out.printf("event msg=%d ext1=%d ext2=%d on %s%n", msg, ext1, ext2,
-                    Thread.currentThread().getName());
-            events.countDown();
-        });
-        System.out.println("bound a DVB object to the substitute service");
+    static final DateTimeFormatter TIME = DateTimeFormatter.ofPattern("EEE HH:mm").withZone(ZoneOffset.UTC);
 
-        Cfg cfg = dvb.getCfg();
-        Cfg.ANT_FrontendParameters fe = new Cfg.ANT_FrontendParameters();
-        fe.type = 1;
-        fe.frequency = 11_778_000;
-        fe.symbolRate = 27_500;
-        System.out.println("Cfg_Tune -> " + cfg.Cfg_Tune(0, fe));
-        Cfg.ANT_Status status = new Cfg.ANT_Status();
-        System.out.println("Cfg_GetStatus -> " + cfg.Cfg_GetStatus(0, status) + ": feStatus="
-                + status.feStatus + " strength=" + status.strength + " quality=" + status.quality);
+    /** A service found by a scan, with the scan settings that found its network. */
+    static final class Channel {
+        Scnm.SCNM_ServiceInfo info;
+        Scnm.SCNM_StartSettings scan;
+        List<Scnm.SCNMNET_FrontEndSettings> transponders;
+        String name;
+    }
 
-        boolean all = events.await(10, TimeUnit.SECONDS);
-        System.out.println(all ? "received " + wanted + " events" : "timed out waiting for events");
+    final DVB dvb = new DVB();
+    final BlockingQueue<int[]> events = new LinkedBlockingQueue<>();
+    final String wantedService;
+    final int page;
+    final File out;
+
+    Demo(String service, int page, File out) {
+        this.wantedService = service;
+        this.page = page;
+        this.out = out;
+        dvb.setOnEventListener((d, msg, ext1, ext2, obj) -> events.add(new int[] {msg, ext1, ext2}));
+    }
+
+    public static void main(String[] args) throws Exception {
+        String service = null;
+        int page = 0x100;
+        File out = new File("demo-out");
+        for (int i = 0; i + 1 < args.length; i += 2) {
+            if (args[i].equals("--service")) service = args[i + 1];
+            else if (args[i].equals("--page")) page = Integer.parseInt(args[i + 1], 16);
+            else if (args[i].equals("--out")) out = new File(args[i + 1]);
+        }
+        out.mkdirs();
+        new Demo(service, page, out).run();
+        System.exit(0);
+    }
+
+    static void title(String text) {
+        System.out.println();
+        System.out.println("== " + text);
+    }
+
+    /** Waits up to 10 s for event `msg`, and gives its two values. */
+    int[] await(int msg) throws InterruptedException {
+        long end = System.nanoTime() + TimeUnit.SECONDS.toNanos(10);
+        for (int[] e; (e = events.poll(end - System.nanoTime(), TimeUnit.NANOSECONDS)) != null; ) {
+            if (e[0] == msg) return e;
+        }
+        throw new IllegalStateException("no event " + msg);
+    }
+
+    void run() throws Exception {
+        Scnm scnm = dvb.getScnm();
+        title("System start-up");
+        Scnm.DVB_Config config = new Scnm.DVB_Config();
+        System.out.println("Dvb_SystemInit -> " + scnm.Dvb_SystemInit(config) + " (the event database exists)");
+
+        List<Channel> channels = new ArrayList<>();
+        scan(scnm, "Satellite 19.2E", satellite(11362000, 22000000, 1, 1, 0, 192), channels);
+        scan(scnm, "Satellite 13.0E", satellite(10719000, 27500000, 0, 2, 1, 130), channels);
+        scan(scnm, "Cable", cable(394000), channels);
+        scan(scnm, "Terrestrial", terrestrial(506000), channels);
+
+        title("Channel list");
+        channels.sort(Comparator.comparingLong(c -> c.info.lcn));
+        for (Channel c : channels) {
+            String type = c.info.svcType == 2 ? "radio" : c.info.svcType == 0x19 ? "TV HD" : "TV";
+            System.out.printf("%4d  %-30s %-6s %s%s%n", c.info.lcn, c.name, type,
+                    c.info.caSysId0 != 0 ? "scrambled " : "", delivery(c.scan.type));
+        }
+        Channel chosen = choose(channels);
+        play(chosen);
+
+        title("Shut-down");
+        System.out.println("Dvb_SystemUnInit -> " + scnm.Dvb_SystemUnInit(config));
         dvb.release();
-        System.exit(all ? 0 : 1);
+    }
+
+    static String delivery(int type) {
+        return type == 0 ? "satellite" : type == 1 ? "cable" : "terrestrial";
+    }
+
+    static Scnm.SCNM_StartSettings satellite(int khz, int rate, int modulation, int fec, int pol, int position) {
+        Scnm.SCNM_StartSettings s = new Scnm.SCNM_StartSettings();
+        s.type = 0;
+        s.frequency = khz;
+        s.symbolRate = rate;
+        s.modulation = modulation;
+        s.fecInner = fec;
+        s.polarization = pol;
+        s.lnbLowLO = 9750;
+        s.lnbHigLO = 10600;
+        s.tone = 2; // the band follows the frequency
+        s.lnbpower = 1;
+        s.satPosition = position;
+        return s;
+    }
+
+    static Scnm.SCNM_StartSettings cable(int khz) {
+        Scnm.SCNM_StartSettings s = new Scnm.SCNM_StartSettings();
+        s.type = 1;
+        s.frequency = khz;
+        s.symbolRate = 6900000;
+        s.modulation = 7; // auto
+        s.fecInner = 10;
+        return s;
+    }
+
+    static Scnm.SCNM_StartSettings terrestrial(int khz) {
+        Scnm.SCNM_StartSettings s = new Scnm.SCNM_StartSettings();
+        s.type = 2;
+        s.frequency = khz;
+        s.bandwidth = 8000;
+        return s;
+    }
+
+    /** A network scan from one transponder, with a progress bar, adding what it found. */
+    void scan(Scnm scnm, String what, Scnm.SCNM_StartSettings settings, List<Channel> channels)
+            throws InterruptedException {
+        title("Scan: " + what);
+        Scnm.SCNM_OpenSettings open = new Scnm.SCNM_OpenSettings();
+        long handle = scnm.Scnm_Open(open);
+        settings.scanType = 1; // the network's transponders, from its NIT
+        settings.langCode = "eng";
+        int started = scnm.Scnm_Start(handle, settings);
+        Scnm.SCNM_GetStatus status = new Scnm.SCNM_GetStatus();
+        int shown = -1;
+        do {
+            Thread.sleep(20);
+            scnm.Scnm_GetStatus(handle, status);
+            if (status.sfStatus == shown) continue;
+            shown = status.sfStatus;
+            int bar = Math.max(0, Math.min(40, shown * 40 / 100));
+            System.out.printf("\r[%-40s] %3d%%", new String(new char[bar]).replace('\0', '#'), shown);
+        } while (started == 0 && status.result == 1);
+        System.out.println(status.result == 2 ? "  done" : "  result " + status.result + " (start " + started + ")");
+        List<Scnm.SCNMNET_FrontEndSettings> transponders = new ArrayList<>();
+        for (int i = 0, n = scnm.Scnm_CreateNetworkList(handle); i < n; i++) {
+            Scnm.SCNMNET_FrontEndSettings t = new Scnm.SCNMNET_FrontEndSettings();
+            scnm.Scnm_GetNetworkList(i, t);
+            transponders.add(t);
+        }
+        int services = scnm.Scnm_CreateServiceList(handle);
+        for (int i = 0; i < services; i++) {
+            Channel c = new Channel();
+            c.info = new Scnm.SCNM_ServiceInfo();
+            scnm.Scnm_GetServiceList(i, c.info);
+            c.name = BroadcastText.decode(c.info.svcName);
+            c.scan = settings;
+            c.transponders = transponders;
+            channels.add(c);
+        }
+        System.out.println(transponders.size() + " transponders, " + services + " services");
+        scnm.Scnm_Close(handle);
+    }
+
+    Channel choose(List<Channel> channels) {
+        for (Channel c : channels) {
+            if (wantedService == null ? c.info.svcType != 2 && c.name.contains("Kanal Eins HD")
+                    : c.name.equalsIgnoreCase(wantedService) || wantedService.equals("" + c.info.lcn)) {
+                return c;
+            }
+        }
+        return channels.get(0);
+    }
+
+    static Strm.STRM_FrontEnd frontEnd(Scnm.SCNM_StartSettings s, Scnm.SCNMNET_FrontEndSettings t) {
+        Strm.STRM_FrontEnd f = new Strm.STRM_FrontEnd();
+        f.type = s.type;
+        f.frequency = t.frequency;
+        f.symbolRate = t.symbolRate;
+        f.fecInner = t.fecInner;
+        f.modulation = t.modulation;
+        f.polarization = t.polarization;
+        f.rolloff = t.rolloff;
+        f.bandwidth = s.type == 2 ? t.symbolRate : s.bandwidth;
+        f.tone = s.tone;
+        f.lnbpower = s.lnbpower;
+        f.lnbLowLO = s.lnbLowLO;
+        f.lnbHigLO = s.lnbHigLO;
+        f.satPosition = s.satPosition;
+        return f;
+    }
+
+    void play(Channel c) throws Exception {
+        title("Playing " + c.info.lcn + " " + c.name);
+        Strm strm = dvb.getStrm();
+        Strm.STRM_OpenSettings open = new Strm.STRM_OpenSettings();
+        open.szPath = "";
+        long handle = strm.Strm_Open(open);
+        Strm.STRM_Service svc = new Strm.STRM_Service();
+        svc.svcId = c.info.svcId;
+        svc.videoPid = c.info.videoPid;
+        svc.videoType = c.info.videoType;
+        svc.audioPid = c.info.audioPid;
+        svc.audioType = c.info.audioType;
+        svc.pcrPid = c.info.pcrPid;
+        svc.pmtPid = c.info.pmtPid;
+        svc.caSysId0 = c.info.caSysId0;
+        Strm.STRM_LangCode langs = new Strm.STRM_LangCode();
+        langs.langCode0 = "deu";
+        langs.langCode1 = "eng";
+        int started = -1;
+        for (Scnm.SCNMNET_FrontEndSettings t : c.transponders) {
+            started = strm.Strm_Start(handle, svc, langs, frontEnd(c.scan, t));
+            if (started == 0) break;
+        }
+        System.out.println("Strm_Start -> " + started);
+        Strm.STRM_GetStatus st = new Strm.STRM_GetStatus();
+        for (int i = 0; i < 100 && (st.feStatus & 0x10) == 0; i++) {
+            Thread.sleep(20);
+            strm.Strm_GetStatus(handle, st);
+        }
+        Thread.sleep(100);
+        strm.Strm_GetStatus(handle, st);
+        System.out.printf("status 0x%02x, strength %d%%, SNR %.1f dB, video PTS %d, %d.%03d fps, picture %d%n",
+                st.feStatus, st.feStrength, st.feSnr / 10.0, st.videoPts & 0xFFFFFFFFL, st.fpsInteger,
+                st.fpsDecimal, st.pictureStatus);
+
+        Strm.STRM_StreamInfo info = new Strm.STRM_StreamInfo();
+        strm.Strm_CreatStreamInfo(handle, info);
+        System.out.printf("components: PCR PID %d, CA %04x%n", info.pcrPid, info.caSysId0);
+        Strm.SubtitleContent subtitle = null;
+        Strm.TeletextContent teletext = null;
+        for (int i = 0; i < info.videoCount; i++) {
+            Strm.VideoContent v = new Strm.VideoContent();
+            strm.Strm_GetVideoStreamInfo(i, v);
+            System.out.printf("  video    PID %4d type 0x%02x%n", v.pid, v.type);
+        }
+        for (int i = 0; i < info.audioCount; i++) {
+            Strm.AudioContent a = new Strm.AudioContent();
+            strm.Strm_GetAudioStreamInfo(i, a);
+            System.out.printf("  audio    PID %4d type 0x%02x %s%s %s%n", a.pid, a.type, a.langCode0,
+                    a.isDolbyAC3 != 0 ? " AC-3" : "", a.streamName);
+        }
+        for (int i = 0; i < info.subtitleCount; i++) {
+            Strm.SubtitleContent s = new Strm.SubtitleContent();
+            strm.Strm_GetSubTilteStreamInfo(i, s);
+            subtitle = subtitle == null ? s : subtitle;
+            System.out.printf("  subtitle PID %4d type 0x%02x %s pages %d/%d%n", s.pid, s.type, s.langCode,
+                    s.compositionPageId, s.ancillaryPageId);
+        }
+        for (int i = 0; i < info.teletextCount; i++) {
+            Strm.TeletextContent t = new Strm.TeletextContent();
+            strm.Strm_GetTeleTextStreamInfo(i, t);
+            teletext = teletext == null ? t : teletext;
+            System.out.printf("  teletext PID %4d %s page %d%02x %s%n", t.pid, t.langCode, t.magazineNumber,
+                    t.pageNumber, t.streamName);
+        }
+
+        events(strm, handle);
+        schedule(strm, handle, c);
+        if (subtitle != null) subtitles(handle, subtitle);
+        if (teletext != null) teletext(handle, teletext);
+
+        System.out.println();
+        System.out.println("Strm_Stop -> " + strm.Strm_Stop(handle, false) + ", Strm_Close -> "
+                + strm.Strm_Close(handle));
+    }
+
+    static void printEvent(String which, Strm.EpgEvent e) {
+        System.out.printf("%-9s %s  %3d min  %s%n           %s%n", which,
+                TIME.format(Instant.ofEpochSecond(e.startTime & 0xFFFFFFFFL)), e.duration / 60,
+                BroadcastText.decode(e.name), BroadcastText.decode(e.text));
+    }
+
+    void events(Strm strm, long handle) {
+        title("Present and following");
+        Strm.EpgEvent now = new Strm.EpgEvent();
+        Strm.EpgEvent next = new Strm.EpgEvent();
+        Strm.ExtEpgEvent nowExt = new Strm.ExtEpgEvent();
+        Strm.ExtEpgEvent nextExt = new Strm.ExtEpgEvent();
+        strm.Strm_GetAllEvent(handle, now, next, nowExt, nextExt);
+        printEvent("now", now);
+        for (int k = 0; k < nowExt.itemCount; k++) {
+            Strm.ExtEpgEventItem item = new Strm.ExtEpgEventItem();
+            strm.Strm__GetExtEPGEventNow(k, item);
+            System.out.printf("           %s: %s%n", item.itemDesc, item.type);
+        }
+        printEvent("next", next);
+        for (int k = 0; k < nextExt.itemCount; k++) {
+            Strm.ExtEpgEventItem item = new Strm.ExtEpgEventItem();
+            strm.Strm__GetExtEPGEventNext(k, item);
+            System.out.printf("           %s: %s%n", item.itemDesc, item.type);
+        }
+    }
+
+    void schedule(Strm strm, long handle, Channel c) throws InterruptedException {
+        title("Tomorrow on " + c.name + ", from the event database");
+        Strm.EpgSvc svc = new Strm.EpgSvc();
+        svc.svcId = c.info.svcId;
+        svc.tsId = c.info.tsId;
+        svc.onId = c.info.onId;
+        strm.EpgMd_ClearService();
+        strm.EpgMd_AddService(svc);
+        Strm.EpgEvent e = new Strm.EpgEvent();
+        Strm.ExtEpgEvent x = new Strm.ExtEpgEvent();
+        strm.EPG_GetEvent(handle, svc, e, x);
+        printEvent("database", e);
+    }
+
+    /** Waits for a display set with regions and writes it, composed on the display, as a PNG. */
+    void subtitles(long stream, Strm.SubtitleContent content) throws InterruptedException, IOException {
+        title("Subtitles");
+        Subttl sub = dvb.getSubttl();
+        sub.Subttl_Init();
+        Subttl.SUBTTL_Settings s = new Subttl.SUBTTL_Settings();
+        s.pid = content.pid;
+        s.type = content.type;
+        s.langCode = content.langCode;
+        s.compositionPageId = content.compositionPageId;
+        s.ancillaryPageId = content.ancillaryPageId;
+        s.hstrm = stream;
+        long handle = sub.Subttl_Start(s);
+        Subttl.SUBTTL_Data_t data = new Subttl.SUBTTL_Data_t();
+        for (int i = 0; i < 200 && data.numRegions == 0; i++) {
+            Thread.sleep(20);
+            sub.Subttl_GetData(handle, data);
+        }
+        Subttl.SUBTTL_Display display = new Subttl.SUBTTL_Display();
+        sub.Subttl_GetDisplayData(display);
+        int width = display.i_width > 0 ? display.i_width : 720;
+        int height = display.i_height > 0 ? display.i_height : 576;
+        BufferedImage image = new BufferedImage(width, height, BufferedImage.TYPE_INT_ARGB);
+        Subttl.SUBTTL_Page_t pg = new Subttl.SUBTTL_Page_t();
+        sub.Subttl_GetPageData(0, pg);
+        Map<Integer, Subttl.SUBTTL_Clut> cluts = new LinkedHashMap<>();
+        for (int c = 0; c < data.numCluts && c < 4; c++) {
+            Subttl.SUBTTL_Clut clut = new Subttl.SUBTTL_Clut();
+            sub.Subttl_GetClutData(c, clut);
+            cluts.put(clut.i_id, clut);
+        }
+        Subttl.SUBTTL_Clut fallback = new Subttl.SUBTTL_Clut();
+        sub.Subttl_GetDefaultClutData(fallback);
+        for (int d = 0; d < pg.i_region_defs && d < 16; d++) {
+            Subttl.SUBTTL_RegionDef def = new Subttl.SUBTTL_RegionDef();
+            sub.Subttl_GetRegionDefData(0, d, def);
+            for (int r = 0; r < data.numRegions && r < 5; r++) {
+                Subttl.SUBTTL_Region_t region = new Subttl.SUBTTL_Region_t();
+                sub.Subttl_GetRegionData(r, region);
+                if (region.i_id != def.i_id) continue;
+                Subttl.SUBTTL_Clut clut = cluts.getOrDefault(region.i_clut, fallback);
+                int[] table = region.i_depth == 1 ? clut.c_2b : region.i_depth == 2 ? clut.c_4b : clut.c_8b;
+                for (int y = 0; y < region.i_height; y++) {
+                    for (int x = 0; x < region.i_width; x++) {
+                        int px = def.i_x + x;
+                        int py = def.i_y + y;
+                        int index = region.p_pixbuf[y * region.i_width + x] & 0xFF;
+                        if (px < width && py < height && index < table.length) image.setRGB(px, py, table[index]);
+                    }
+                }
+            }
+        }
+        File png = new File(out, "subtitle.png");
+        ImageIO.write(image, "png", png);
+        System.out.printf("display set at PTS %d: %d regions, %d CLUTs, page %d -> %s%n",
+                data.i_pts & 0xFFFFFFFFL, data.numRegions, data.numCluts, pg.i_id, png);
+        sub.Subttl_Stop(handle);
+    }
+
+    void teletext(long stream, Strm.TeletextContent content) {
+        title("Teletext page " + Integer.toHexString(page));
+        Teltxt ttx = dvb.getTeltxt();
+        Teltxt.TELTXT_Settings s = new Teltxt.TELTXT_Settings();
+        s.pid = content.pid;
+        s.type = content.type;
+        s.langCode = content.langCode;
+        s.magazineNumber = content.magazineNumber;
+        s.pageNumber = content.pageNumber;
+        s.componetTag = content.componetTag;
+        s.streamName = content.streamName;
+        long handle = ttx.Teltxt_Start(s);
+        Teltxt.TELTXT_NavPages nav = new Teltxt.TELTXT_NavPages();
+        System.out.printf("Teltxt_SetData -> %d; navigation %x %x %x %x%n", ttx.Teltxt_SetData(handle, page, 0, nav),
+                nav.prev100, nav.prev10, nav.next10, nav.next100);
+        ttx.Teltxt_Stop(handle);
     }
 }
