@@ -104,15 +104,25 @@ jstring Spy_op(JNIEnv* env, jclass, jint i) {
     return callAt(env, i, &c) ? env->NewStringUTF(c.op.c_str()) : nullptr;
 }
 
-jlongArray Spy_args(JNIEnv* env, jclass, jint i) {
-    dvbspy::Call c;
-    if (!callAt(env, i, &c)) return nullptr;
-    jlongArray a = env->NewLongArray(static_cast<jsize>(c.args.size()));
-    if (a != nullptr && !c.args.empty()) {
-        std::vector<jlong> v(c.args.begin(), c.args.end());
-        env->SetLongArrayRegion(a, 0, static_cast<jsize>(v.size()), v.data());
+jbyteArray toBytes(JNIEnv* env, const void* data, size_t size) {
+    jbyteArray a = env->NewByteArray(static_cast<jsize>(size));
+    if (a != nullptr && size != 0) {
+        env->SetByteArrayRegion(a, 0, static_cast<jsize>(size), static_cast<const jbyte*>(data));
     }
     return a;
+}
+
+jlongArray toLongs(JNIEnv* env, const std::vector<jlong>& v) {
+    jlongArray a = env->NewLongArray(static_cast<jsize>(v.size()));
+    if (a != nullptr && !v.empty())
+        env->SetLongArrayRegion(a, 0, static_cast<jsize>(v.size()), v.data());
+    return a;
+}
+
+jlongArray Spy_args(JNIEnv* env, jclass, jint i) {
+    dvbspy::Call c;
+    return callAt(env, i, &c) ? toLongs(env, std::vector<jlong>(c.args.begin(), c.args.end()))
+                              : nullptr;
 }
 
 jbyteArray Spy_record(JNIEnv* env, jclass, jint i, jint r) {
@@ -123,13 +133,7 @@ jbyteArray Spy_record(JNIEnv* env, jclass, jint i, jint r) {
                              c.records.size());
         return nullptr;
     }
-    const auto& bytes = c.records[r];
-    jbyteArray a = env->NewByteArray(static_cast<jsize>(bytes.size()));
-    if (a != nullptr && !bytes.empty()) {
-        env->SetByteArrayRegion(a, 0, static_cast<jsize>(bytes.size()),
-                                reinterpret_cast<const jbyte*>(bytes.data()));
-    }
-    return a;
+    return toBytes(env, c.records[r].data(), c.records[r].size());
 }
 
 jlong Spy_owner(JNIEnv* env, jclass, jint i) {
@@ -181,38 +185,32 @@ void Spy_omit(JNIEnv* env, jclass, jobjectArray modules) {
 }
 
 jlongArray Spy_liveDvbs(JNIEnv* env, jclass) {
-    auto live = dvbsvc::liveDvbs();
     std::vector<jlong> v;
-    for (const auto& dvb : live)
-        v.push_back(static_cast<jlong>(reinterpret_cast<uintptr_t>(dvb.get())));
-    jlongArray a = env->NewLongArray(static_cast<jsize>(v.size()));
-    if (a != nullptr && !v.empty())
-        env->SetLongArrayRegion(a, 0, static_cast<jsize>(v.size()), v.data());
-    return a;
+    for (const auto& dvb : dvbsvc::liveDvbs()) v.push_back(reinterpret_cast<uintptr_t>(dvb.get()));
+    return toLongs(env, v);
 }
 
 jint Spy_liveDvbCount(JNIEnv*, jclass) {
     return static_cast<jint>(dvbsvc::liveDvbCount());
 }
 
+android::sp<android::DVB> liveAt(jlong address) {
+    for (const auto& dvb : dvbsvc::liveDvbs()) {
+        if (static_cast<jlong>(reinterpret_cast<uintptr_t>(dvb.get())) == address) return dvb;
+    }
+    return nullptr;
+}
+
 // Strong references on the DVB object at `address`, not counting the one taken to ask; -1
 // when no such object lives.
 jint Spy_strongCount(JNIEnv*, jclass, jlong address) {
-    for (const auto& dvb : dvbsvc::liveDvbs()) {
-        if (static_cast<jlong>(reinterpret_cast<uintptr_t>(dvb.get())) == address) {
-            return dvb->getStrongCount() - 1;
-        }
-    }
-    return -1;
+    auto dvb = liveAt(address);
+    return dvb != nullptr ? dvb->getStrongCount() - 1 : -1;
 }
 
 jboolean Spy_hasListener(JNIEnv*, jclass, jlong address) {
-    for (const auto& dvb : dvbsvc::liveDvbs()) {
-        if (static_cast<jlong>(reinterpret_cast<uintptr_t>(dvb.get())) == address) {
-            return dvb->mListener != nullptr;
-        }
-    }
-    return false;
+    auto dvb = liveAt(address);
+    return dvb != nullptr && dvb->mListener != nullptr;
 }
 
 jint Spy_liveListenerCount(JNIEnv*, jclass) {
@@ -293,12 +291,7 @@ jbyteArray Spy_cacheEntry(JNIEnv* env, jclass, jstring symbol, jint index, jint 
                  sym != nullptr;
     dlclose(lib);
     if (!found || (int64_t{index} + 1) * size > static_cast<int64_t>(sym->st_size)) return nullptr;
-    jbyteArray a = env->NewByteArray(size);
-    if (a != nullptr) {
-        env->SetByteArrayRegion(a, 0, size,
-                                reinterpret_cast<const jbyte*>(base + int64_t{index} * size));
-    }
-    return a;
+    return toBytes(env, base + int64_t{index} * size, size);
 }
 
 jint Spy_pointerSize(JNIEnv*, jclass) {
