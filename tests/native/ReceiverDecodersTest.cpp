@@ -23,9 +23,17 @@ class DecodersTest : public ::testing::Test {
 protected:
     DecodersTest() {
         dvbmodel::Broadcast b = dvbmodel::builtinBroadcast(kStart / 1000);
+        auto& pages = b.networks[3].transports[0].services[0].teletext;
         // Page 0x150 without links: its navigation comes from the pages present.
-        for (auto& p : b.networks[3].transports[0].services[0].teletext)
+        for (auto& p : pages)
             if (p.number == 0x150) p.links = {};
+        // Page 0x777 with what the built-in pages do not use: hold, conceal, blast-through.
+        dvbmodel::TeletextPage crafted;
+        crafted.number = 0x777;
+        for (auto& row : crafted.rows) row.fill(' ');
+        const uint8_t row1[] = {0x11, 0x7F, 0x1E, 0x03, 0x18, 'A', 0x12, 0x1F, 'a', 'B'};
+        std::copy(std::begin(row1), std::end(row1), crafted.rows[1].begin());
+        pages.insert(pages.begin(), crafted);
         rx = std::make_shared<Receiver>(std::move(b), Clock::Settings{true, kStart, 0.0, 7},
                                         [this](int msg, int a, int b) {
                                             std::lock_guard<std::mutex> lock(eventLock);
@@ -61,11 +69,9 @@ protected:
         std::lock_guard<std::mutex> lock(eventLock);
         return std::move(events);
     }
-    int32_t select(int32_t page, int32_t subpage, std::array<int32_t, 4>* nav = nullptr) {
-        std::array<int32_t, 4> n{};
-        if (nav == nullptr) nav = &n;
-        return teltxt->SetData(txtHandle, page, subpage, &(*nav)[0], &(*nav)[1], &(*nav)[2],
-                               &(*nav)[3]);
+    int32_t select(int32_t page, int32_t subpage = 0) {
+        nav = {};
+        return teltxt->SetData(txtHandle, page, subpage, &nav[0], &nav[1], &nav[2], &nav[3]);
     }
     TeltxtImage image() {
         TeltxtImage i;
@@ -79,6 +85,7 @@ protected:
     android::sp<ReceiverSubttl> subttl;
     android::sp<ReceiverTeltxt> teltxt;
     int32_t stream = 0, subHandle = 0, txtHandle = 0;
+    std::array<int32_t, 4> nav{};
     std::mutex eventLock;
     Events events;
 };
@@ -93,10 +100,9 @@ TEST_F(DecodersTest, SubtitleBufferHoldsTheModelsDisplaySetWithTheStreamsPts) {
     strm->GetStatus(stream, &st);
     // Shown at the loop's start, 1000 ms ago.
     EXPECT_EQ(static_cast<uint32_t>(st.localPts - data->i_pts), 90000u);
-    EXPECT_EQ(data->numPage, 1);
-    EXPECT_EQ(std::vector<int32_t>({data->page[0].i_id, data->page[0].i_timeout,
+    EXPECT_EQ(std::vector<int32_t>({data->numPage, data->page[0].i_id, data->page[0].i_timeout,
                                     data->page[0].i_state, data->page[0].i_version}),
-              std::vector<int32_t>({1, set.timeout, set.state, set.version}));
+              std::vector<int32_t>({1, 1, set.timeout, set.state, set.version}));
     ASSERT_EQ(data->page[0].i_region_defs, static_cast<int32_t>(set.placements.size()));
     ASSERT_EQ(data->numRegions, static_cast<int32_t>(set.regions.size()));
     for (size_t r = 0; r < set.regions.size(); ++r) {
@@ -114,15 +120,13 @@ TEST_F(DecodersTest, SubtitleBufferHoldsTheModelsDisplaySetWithTheStreamsPts) {
     ASSERT_EQ(data->numCluts, 1);
     EXPECT_EQ(data->cluts[0].i_id, set.cluts[0].id);
     EXPECT_EQ(memcmp(data->cluts[0].c_8b, set.cluts[0].c8.data(), 1024), 0);
-    EXPECT_EQ(memcmp(data->cluts[0].c_2b, set.cluts[0].c2.data(), 16), 0);
     EXPECT_EQ(std::vector<int32_t>({data->display.i_id, data->display.i_width,
                                     data->display.i_height, data->display.b_windowed}),
               std::vector<int32_t>({1, 720, 576, 0}));
     EXPECT_EQ(memcmp(&data->defaultClut, &defaultClut(), sizeof(SUBTTL_Clut)), 0);
     EXPECT_EQ(bytes.back(), 0xAA);
 
-    SUBTTL_Data* none = nullptr;
-    EXPECT_EQ(subttl->GetData(subHandle, none), kErrBadParameter);
+    EXPECT_EQ(subttl->GetData(subHandle, nullptr), kErrBadParameter);
     EXPECT_EQ(subttl->Stop(subHandle), kOk);
     EXPECT_EQ(subttl->GetData(subHandle, data), kErrBadHandle);
 }
@@ -130,8 +134,7 @@ TEST_F(DecodersTest, SubtitleBufferHoldsTheModelsDisplaySetWithTheStreamsPts) {
 TEST(SubtitleData, StaysWithinTheBuffersRoom) {
     dvbmodel::DisplaySet set;
     dvbmodel::Region big;
-    big.width = 700;
-    big.height = 600;
+    big.width = 700, big.height = 600;
     big.pixels.assign(700 * 600, 5);
     big.objects.resize(20);
     set.regions.assign(7, big);
@@ -154,14 +157,12 @@ TEST(SubtitleData, DefaultClutHasTheStandardsColours) {
         const SUBTTL_ClutEntry& entry;
         std::array<int, 4> ycrcbt;
     } cases[] = {
-            {c.c_2b[0], {0, 128, 128, 255}},    {c.c_2b[1], {235, 128, 128, 0}},
-            {c.c_2b[2], {16, 128, 128, 0}},     {c.c_2b[3], {126, 128, 128, 0}},
-            {c.c_4b[1], {81, 240, 90, 0}},      {c.c_4b[2], {145, 34, 54, 0}},
-            {c.c_4b[4], {41, 110, 240, 0}},     {c.c_4b[9], {49, 184, 109, 0}},
-            {c.c_8b[0], {0, 128, 128, 255}},    {c.c_8b[0x01], {81, 240, 90, 191}},
-            {c.c_8b[0x10], {60, 203, 103, 0}},  {c.c_8b[0x4C], {41, 110, 240, 128}},
-            {c.c_8b[0x77], {235, 128, 128, 0}}, {c.c_8b[0x80], {126, 128, 128, 0}},
-            {c.c_8b[0x88], {16, 128, 128, 0}},  {c.c_8b[0xD6], {181, 141, 159, 0}},
+            {c.c_2b[0], {0, 128, 128, 255}},   {c.c_2b[1], {235, 128, 128, 0}},
+            {c.c_2b[2], {16, 128, 128, 0}},    {c.c_2b[3], {126, 128, 128, 0}},
+            {c.c_4b[4], {41, 110, 240, 0}},    {c.c_4b[9], {49, 184, 109, 0}},
+            {c.c_8b[0], {0, 128, 128, 255}},   {c.c_8b[0x01], {81, 240, 90, 191}},
+            {c.c_8b[0x10], {60, 203, 103, 0}}, {c.c_8b[0x4C], {41, 110, 240, 128}},
+            {c.c_8b[0x88], {16, 128, 128, 0}}, {c.c_8b[0xD6], {181, 141, 159, 0}},
     };
     for (const auto& k : cases) {
         EXPECT_EQ((std::array<int, 4>{k.entry.y, k.entry.cr, k.entry.cb, k.entry.t}), k.ycrcbt)
@@ -175,7 +176,7 @@ TEST_F(DecodersTest, NewDisplaySetsAndPageSendingsRaiseTheirEvents) {
     };
     EXPECT_EQ(take(), (Events{{kEvtSubtitle, subHandle, regions(0)},
                               {kEvtTeletext, txtHandle, 0x1000000}}));
-    EXPECT_EQ(select(0x101, 0), kOk);
+    EXPECT_EQ(select(0x101), kOk);
     advance(3499);
     EXPECT_EQ(take(), Events{});
     advance(1);  // 4500: the cue is cleared
@@ -204,7 +205,6 @@ TEST_F(DecodersTest, TeletextPageImageShowsCharactersWithTheirAttributes) {
         uint16_t flags;
     } cases[] = {
             {0x100, 0, 1, U'P', kTtxWhite, kTtxBlack, 0},
-            {0x100, 0, 4, U'0', kTtxWhite, kTtxBlack, 0},
             {0x100, 0, 39, U'1', kTtxWhite, kTtxBlack, 0},  // the clock: 20:00:01
             {0x100, 1, 1, U' ', kTtxBlue, kTtxBlue, 0},     // new background, set at
             {0x100, 1, 3, U' ', kTtxWhite, kTtxBlue, 0},    // double height, set after
@@ -217,18 +217,24 @@ TEST_F(DecodersTest, TeletextPageImageShowsCharactersWithTheirAttributes) {
             {0x101, 22, 2, U'W', kTtxWhite, kTtxBlack, kCellFlash},
             {0x150, 20, 4, U' ', kTtxYellow, kTtxBlack, DH | kCellBoxed},
             {0x150, 21, 5, U'E', kTtxYellow, kTtxBlack, Lower | kCellBoxed},
-            {0x300, 5, 2, U'█', kTtxGreen, kTtxBlack, Mosaic},
-            {0x300, 5, 9, U'█', kTtxGreen, kTtxBlack, Mosaic},  // the coast's attribute, held
+            {0x777, 1, 0, U' ', kTtxWhite, kTtxBlack, 0},
+            {0x777, 1, 1, U'█', kTtxRed, kTtxBlack, Mosaic},
+            {0x777, 1, 2, U'█', kTtxRed, kTtxBlack, Mosaic},  // hold, set at
+            {0x777, 1, 3, U'█', kTtxRed, kTtxBlack, Mosaic},  // held, then alphanumerics
+            {0x777, 1, 5, U'A', kTtxYellow, kTtxBlack, kCellConceal},
+            {0x777, 1, 7, U' ', kTtxGreen, kTtxBlack, 0},  // nothing held since the change
+            {0x777, 1, 8, U'\U0001FB1F', kTtxGreen, kTtxBlack, Mosaic},
+            {0x777, 1, 9, U'B', kTtxGreen, kTtxBlack, 0},
     };
     for (const auto& k : cases) {
-        ASSERT_EQ(select(k.page, 0), kOk);
+        ASSERT_EQ(select(k.page), kOk);
         const TeltxtImage i = image();
         const TeltxtCellRecord& c = i.cells[k.row][k.col];
         EXPECT_EQ(std::vector<uint32_t>({c.ch, c.foreground, c.background, c.flags}),
                   std::vector<uint32_t>({k.ch, k.fg, k.bg, k.flags}))
                 << std::hex << k.page << std::dec << " row " << k.row << " col " << k.col;
     }
-    select(0x150, 0);
+    select(0x150);
     const TeltxtImage i = image();
     EXPECT_EQ(std::vector<uint32_t>({i.page, i.subcode, i.controlBits, i.nationalOption, i.status,
                                      i.time, i.subpages}),
@@ -248,12 +254,11 @@ TEST_F(DecodersTest, NavigationFollowsTheLinksOrThePagesPresent) {
     } cases[] = {
             {0x200, kOk, {0x101, 0x200, 0x300, 0x150}},  // red, green, yellow, cyan
             {0x150, kOk, {0x888, 0x100, 0x200, 0x200}},
-            {0x555, kErrNoData, {0x300, 0x300, 0x888, 0x888}},
+            {0x555, kErrNoData, {0x300, 0x300, 0x777, 0x777}},
             {0x900, kErrBadParameter, {0, 0, 0, 0}},
     };
     for (const auto& k : cases) {
-        std::array<int32_t, 4> nav{};
-        EXPECT_EQ(select(k.page, 0, &nav), k.result) << std::hex << k.page;
+        EXPECT_EQ(select(k.page), k.result) << std::hex << k.page;
         EXPECT_EQ(nav, k.nav) << std::hex << k.page;
     }
 }
