@@ -32,6 +32,8 @@ enum EventCode : int {
     kEvtPositioner = 211,    // front end, dish position reached (tenths of a degree)
     kEvtPresent = 220,       // stream handle, id of the new present event
     kEvtSystemReady = 230,   // 0 or a Result, 0
+    kEvtSubtitle = 240,      // subtitle decoder handle, regions of the new display set
+    kEvtTeletext = 250,      // teletext decoder handle, page << 16 | subcode of the new sending
 };
 
 // Front-end type codes of ANT_FrontendParameters.type.

@@ -234,7 +234,26 @@ std::vector<std::array<int, 3>> Receiver::collectEvents(int64_t now) {
             if (ev != nullptr) out.push_back({kEvtPresent, handle, id});
         }
     }
+    collectDecoderEvents(now, out);
     return out;
+}
+
+bool Receiver::decoding(const Stream& s, int64_t now, int64_t* from) const {
+    if (!s.started || s.service == nullptr) return false;
+    const Frontend& fe = frontends[s.frontend];
+    Signal sig = signal(fe.params, fe.tunedAt, now);
+    if (sig.transport != s.transport || (sig.status & kFeLock) == 0) return false;
+    if (s.service->scrambled && outputs.caStandby) return false;
+    *from = std::max(s.startedAt, sig.lockedAt);
+    return true;
+}
+
+int64_t Receiver::ptsAt(const Stream& s, int64_t from, int64_t ms) const {
+    constexpr int64_t kPtsWrap = int64_t{1} << 33;
+    uint32_t key = static_cast<uint32_t>(s.transport->tsid) << 16 | s.service->id;
+    int64_t pts = (mix(mClock.seed(), key, 3) + (ms - from) * 90) % kPtsWrap;
+    // Before `from` (a display set sent before the stream began) the count runs backwards.
+    return pts < 0 ? pts + kPtsWrap : pts;
 }
 
 int64_t Receiver::toleranceKHz(dvbmodel::Delivery d) {

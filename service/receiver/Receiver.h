@@ -127,10 +127,22 @@ struct Stream {
     int64_t shiftSince = 0, shiftPos = 0, shiftAt = 0;
 };
 
+// What a decoder last reported: the sending (a display set, a teletext page) of a timed list
+// of the model that was current, by its list index and the time it was sent (UTC ms).
+struct Sending {
+    size_t index = SIZE_MAX;
+    int64_t at = 0;
+    bool operator==(const Sending& o) const { return index == o.index && at == o.at; }
+    bool operator!=(const Sending& o) const { return !(*this == o); }
+};
+
 struct Decoder {
     int32_t stream = 0;
     uint16_t pid = 0;
-    int32_t page = 100, subpage = 0;
+    uint16_t compositionPageId = 0, ancillaryPageId = 0;  // subtitles
+    // Teletext: the page selected (0x100..0x8FF) and its subcode (0: the subpages rotate).
+    int32_t page = 0x100, subpage = 0;
+    Sending reported;
 };
 
 struct Outputs {
@@ -212,6 +224,13 @@ public:
     static bool plausible(const ANT_FrontendParameters& p);
     int32_t newHandle();
 
+    // Whether started stream `s` decodes its service at `now`: its front end locked on the
+    // service's transponder and the CA module not blocking it; `*from` is when it began.
+    bool decoding(const Stream& s, int64_t now, int64_t* from) const;
+    // The 33-bit PTS of a stream decoding since `from`, at `ms`: 90 kHz from an origin of its
+    // service's own.
+    int64_t ptsAt(const Stream& s, int64_t from, int64_t ms) const;
+
     // Present and following events of `service` at `now` (null where there is none).
     static const dvbmodel::Event* eventAt(const dvbmodel::Service& service, int64_t seconds);
     static const dvbmodel::Event* eventAfter(const dvbmodel::Service& service, int64_t seconds);
@@ -219,6 +238,8 @@ public:
 private:
     void run();
     std::vector<std::array<int, 3>> collectEvents(int64_t now);
+    // New display sets and teletext page updates of the decoders (Decoders.cpp).
+    void collectDecoderEvents(int64_t now, std::vector<std::array<int, 3>>& out);
 
     dvbmodel::Broadcast mBroadcast;
     Clock mClock;

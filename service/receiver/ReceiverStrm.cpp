@@ -7,7 +7,6 @@
 namespace dvbrx {
 namespace {
 
-constexpr int64_t kPtsWrap = int64_t{1} << 33;
 // An audio frame of 1152 samples at 48 kHz lasts 24 ms: 2160 ticks of 90 kHz.
 constexpr int64_t kAudioFrameTicks = 2160;
 // Bit rates of a time-shift recording, bits per second.
@@ -177,8 +176,7 @@ int32_t ReceiverStrm::GetStatus(int32_t handle, STRM_GetStatus* status) {
     status->pictureStatus = onAir && blocked ? kScrambled : kNoPicture;
     if (onAir && !blocked) {
         int64_t from = std::max(s.startedAt, sig.lockedAt);
-        uint32_t key = static_cast<uint32_t>(s.transport->tsid) << 16 | svc.id;
-        int64_t pts = (mix(mRx->clock().seed(), key, 3) + (now - from) * 90) % kPtsWrap;
+        int64_t pts = mRx->ptsAt(s, from, now);
         status->localPts = static_cast<int32_t>(static_cast<uint32_t>(pts));
         if (video != nullptr && video->frameRateMilli > 0) {
             int64_t frame = int64_t{90000} * 1000 / video->frameRateMilli;
