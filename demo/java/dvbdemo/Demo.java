@@ -388,7 +388,23 @@ public final class Demo {
         sub.Subttl_Stop(handle);
     }
 
-    void teletext(long stream, Strm.TeletextContent content) {
+    /** The 2-by-3 cells of a block mosaic character (bit 0 top left ... bit 5 bottom right), or -1. */
+    static int sextant(int ch) {
+        if (ch == 0x258C) return 21;
+        if (ch == 0x2590) return 42;
+        if (ch == 0x2588) return 63;
+        if (ch < 0x1FB00 || ch > 0x1FB3B) return -1;
+        int v = ch - 0x1FB00 + 1;
+        if (v >= 21) v++;
+        if (v >= 42) v++;
+        return v;
+    }
+
+    /** Teletext's colours in its order, which is also the order of the terminal's colours. */
+    static final int[] RGB = {0x000000, 0xFF0000, 0x00FF00, 0xFFFF00, 0x0000FF, 0xFF00FF, 0x00FFFF, 0xFFFFFF};
+
+    /** Shows page `page` as coloured text on the terminal and writes it as a PNG. */
+    void teletext(long stream, Strm.TeletextContent content) throws IOException {
         title("Teletext page " + Integer.toHexString(page));
         Teltxt ttx = dvb.getTeltxt();
         Teltxt.TELTXT_Settings s = new Teltxt.TELTXT_Settings();
@@ -401,8 +417,51 @@ public final class Demo {
         s.streamName = content.streamName;
         long handle = ttx.Teltxt_Start(s);
         Teltxt.TELTXT_NavPages nav = new Teltxt.TELTXT_NavPages();
-        System.out.printf("Teltxt_SetData -> %d; navigation %x %x %x %x%n", ttx.Teltxt_SetData(handle, page, 0, nav),
-                nav.prev100, nav.prev10, nav.next10, nav.next100);
+        int selected = ttx.Teltxt_SetData(handle, page, 0, nav);
+        byte[] image = new byte[8032];
+        ttx.Teltxt_GetData(handle, 0, image.length, image);
+        java.nio.ByteBuffer b = java.nio.ByteBuffer.wrap(image).order(java.nio.ByteOrder.LITTLE_ENDIAN);
+        System.out.printf("Teltxt_SetData -> %d; subcode %04x, control bits %04x; keys: red %x green %x yellow %x cyan %x%n",
+                selected, b.getShort(2), b.getShort(4), nav.prev100, nav.prev10, nav.next10, nav.next100);
+        BufferedImage png = new BufferedImage(40 * 12, 25 * 20, BufferedImage.TYPE_INT_RGB);
+        java.awt.Graphics2D g = png.createGraphics();
+        g.setFont(new java.awt.Font(java.awt.Font.MONOSPACED, java.awt.Font.BOLD, 16));
+        for (int row = 0; row < 25; row++) {
+            StringBuilder line = new StringBuilder();
+            int shown = -1;
+            for (int col = 0; col < 40; col++) {
+                int at = 32 + (row * 40 + col) * 8;
+                int ch = b.getInt(at);
+                int fg = image[at + 4] & 7;
+                int bg = image[at + 5] & 7;
+                String text = ch == 0 ? " " : new String(Character.toChars(ch));
+                if ((fg << 3 | bg) != shown) line.append("\u001b[").append(30 + fg).append(';').append(40 + bg).append('m');
+                shown = fg << 3 | bg;
+                line.append(text);
+                int flags = b.getShort(at + 6);
+                g.setColor(new java.awt.Color(RGB[bg]));
+                if ((flags & 0x10) == 0) g.fillRect(col * 12, row * 20, 12, (flags & 0x08) != 0 ? 40 : 20);
+                g.setColor(new java.awt.Color(RGB[fg]));
+                int cells = sextant(ch);
+                if (cells >= 0) {
+                    int gap = (flags & 0x40) != 0 ? 2 : 0; // separated mosaics
+                    for (int k = 0; k < 6; k++) {
+                        if ((cells >> k & 1) != 0) g.fillRect(col * 12 + k % 2 * 6, row * 20 + k / 2 * 7, 6 - gap, 7 - gap);
+                    }
+                } else if ((flags & 0x10) == 0) {
+                    java.awt.geom.AffineTransform saved = g.getTransform();
+                    boolean tall = (flags & 0x08) != 0; // double height: this row and the next
+                    g.translate(col * 12, row * 20 + (tall ? 30 : 15));
+                    if (tall) g.scale(1, 2);
+                    g.drawString(text, 0, 0);
+                    g.setTransform(saved);
+                }
+            }
+            System.out.println(line + "\u001b[0m");
+        }
+        File file = new File(out, "teletext-" + Integer.toHexString(page) + ".png");
+        ImageIO.write(png, "png", file);
+        System.out.println("-> " + file);
         ttx.Teltxt_Stop(handle);
     }
 }
