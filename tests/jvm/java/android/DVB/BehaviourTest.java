@@ -108,17 +108,6 @@ class BehaviourTest extends SpyTestBase {
         assertEquals(0, Spy.callCount());
     }
 
-    @ParameterizedTest
-    @ValueSource(ints = {5, -1, 8})
-    void teletextDataOutsideTheArrayLeavesTheBoundsErrorAfterFetching(int start) {
-        byte[] data = new byte[8];
-        Arrays.fill(data, (byte) 0x33);
-        assertThrows(ArrayIndexOutOfBoundsException.class,
-                () -> dvb.getTeltxt().Teltxt_GetData(5, start, 10, data));
-        assertArrayEquals(new long[] {5, 0, 10, 0}, Spy.args(onlyCall("Teltxt::GetData")));
-        for (byte b : data) assertEquals(0x33, b);
-    }
-
     @Test
     void streamTimeIsZeroExtended() {
         Spy.setOut("Strm::GetTime", 1, 0, le32(-1));

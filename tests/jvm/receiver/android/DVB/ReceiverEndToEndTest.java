@@ -1,0 +1,181 @@
+package android.DVB;
+
+import static org.junit.jupiter.api.Assertions.*;
+
+import java.io.File;
+import java.nio.ByteBuffer;
+import java.nio.ByteOrder;
+import java.nio.charset.StandardCharsets;
+import java.util.*;
+import java.util.concurrent.*;
+import org.junit.jupiter.api.*;
+
+/**
+ * The API against the emulated receiver and its built-in broadcast, on a clock that starts at
+ * 2024-03-01T20:00:00Z and runs 20 times faster than real time: start-up, a scan, a service
+ * played with its status, components and events, subtitles and teletext, in one sequence, with
+ * the listener's events in their order.
+ */
+@TestMethodOrder(MethodOrderer.OrderAnnotation.class)
+class ReceiverEndToEndTest {
+    static final DVB dvb = new DVB();
+    static final BlockingQueue<List<Integer>> events = new LinkedBlockingQueue<>();
+    static final File EPG_DB = new File(System.getProperty("dvb.epgdb"));
+    static long stream;
+    static Scnm.SCNM_ServiceInfo kanalEins;
+
+    static {
+        dvb.setOnEventListener((d, msg, e1, e2, obj) -> events.add(List.of(msg, e1, e2)));
+    }
+
+    @AfterAll
+    static void release() {
+        dvb.release();
+    }
+
+    /** The next event of code `msg`, skipping others; fails after 20 s. */
+    static List<Integer> next(int msg) throws InterruptedException {
+        for (List<Integer> e; (e = events.poll(20, TimeUnit.SECONDS)) != null; ) {
+            if (e.get(0) == msg) return e;
+        }
+        throw new AssertionError("no event " + msg);
+    }
+
+    @Test
+    @Order(1)
+    void startUpCreatesTheEventDatabase() throws InterruptedException {
+        EPG_DB.delete();
+        assertEquals(0, dvb.getScnm().Dvb_SystemInit(new Scnm.DVB_Config()));
+        assertTrue(EPG_DB.exists());
+        assertEquals(List.of(230, 0, 0), next(230));
+    }
+
+    @Test
+    @Order(2)
+    void aNetworkScanFindsEveryServiceOfTheTerrestrialNetwork() throws InterruptedException {
+        Scnm scnm = dvb.getScnm();
+        long scan = scnm.Scnm_Open(new Scnm.SCNM_OpenSettings());
+        Scnm.SCNM_StartSettings s = new Scnm.SCNM_StartSettings();
+        s.type = 2;
+        s.frequency = 506000;
+        s.bandwidth = 8000;
+        s.scanType = 1;
+        assertEquals(0, scnm.Scnm_Start(scan, s));
+        int progress = -1;
+        for (List<Integer> e; (e = events.poll(20, TimeUnit.SECONDS)).get(0) != 201; ) {
+            if (e.get(0) == 200) assertTrue(e.get(2) >= progress, "progress only grows");
+            if (e.get(0) == 200) progress = e.get(2);
+        }
+        Scnm.SCNM_GetStatus st = new Scnm.SCNM_GetStatus();
+        scnm.Scnm_GetStatus(scan, st);
+        assertEquals(List.of(2, 100), List.of(st.result, st.sfStatus));
+        Map<Long, String> found = new TreeMap<>();
+        for (int i = 0, n = scnm.Scnm_CreateServiceList(scan); i < n; i++) {
+            Scnm.SCNM_ServiceInfo info = new Scnm.SCNM_ServiceInfo();
+            scnm.Scnm_GetServiceList(i, info);
+            found.put(info.lcn, new String(info.svcName, StandardCharsets.ISO_8859_1));
+            if (info.lcn == 1) kanalEins = info;
+        }
+        // Table 00 names: "Straßenfeger" holds ISO 6937's 0xFB for the sharp s.
+        assertEquals(Map.of(1L, "Kanal Eins", 3L, "Regional Berlin-Brandenburg", 4L, "Nachrichten 24",
+                5L, "Sport Direkt", 6L, "Kultur Kanal", 7L, "Stra\u00FBenfeger Radio"), found);
+        assertEquals(3, scnm.Scnm_CreateNetworkList(scan));
+        assertEquals(0, scnm.Scnm_Close(scan));
+    }
+
+    @Test
+    @Order(3)
+    void aServicePlaysWithItsStatusComponentsAndEvents() throws InterruptedException {
+        Strm strm = dvb.getStrm();
+        Strm.STRM_OpenSettings open = new Strm.STRM_OpenSettings();
+        open.szPath = "";
+        events.clear();
+        stream = strm.Strm_Open(open);
+        Strm.STRM_Service svc = new Strm.STRM_Service();
+        svc.svcId = kanalEins.svcId;
+        Strm.STRM_FrontEnd fe = new Strm.STRM_FrontEnd();
+        fe.type = 2;
+        fe.frequency = 506000;
+        fe.bandwidth = 8000;
+        Strm.STRM_LangCode langs = new Strm.STRM_LangCode();
+        langs.langCode0 = "deu";
+        langs.langCode1 = "eng";
+        assertEquals(0, strm.Strm_Start(stream, svc, langs, fe));
+        assertEquals(List.of(210, 0, 1), next(210));
+        Strm.STRM_GetStatus a = new Strm.STRM_GetStatus();
+        Strm.STRM_GetStatus b = new Strm.STRM_GetStatus();
+        strm.Strm_GetStatus(stream, a);
+        Thread.sleep(100);
+        strm.Strm_GetStatus(stream, b);
+        assertEquals(0x1F, b.feStatus & 0x1F);
+        assertEquals(List.of(25, 0, 1), List.of(b.fpsInteger, b.fpsDecimal, b.pictureStatus));
+        assertTrue(Integer.compareUnsigned(b.localPts, a.localPts) > 0, "PTS advances");
+
+        Strm.STRM_StreamInfo info = new Strm.STRM_StreamInfo();
+        strm.Strm_CreatStreamInfo(stream, info);
+        assertEquals(List.of(1, 3, 1, 1), List.of(info.videoCount, info.audioCount, info.subtitleCount,
+                info.teletextCount));
+        Strm.AudioContent ac3 = new Strm.AudioContent();
+        strm.Strm_GetAudioStreamInfo(2, ac3);
+        assertEquals(List.of(1, "deu"), List.of(ac3.isDolbyAC3, ac3.langCode0));
+
+        Strm.EpgEvent now = new Strm.EpgEvent();
+        Strm.EpgEvent following = new Strm.EpgEvent();
+        Strm.ExtEpgEvent nowExt = new Strm.ExtEpgEvent();
+        strm.Strm_GetAllEvent(stream, now, following, nowExt, new Strm.ExtEpgEvent());
+        long clock = strm.Strm_GetTime(stream, 0);
+        assertTrue(now.startTime <= clock && clock < (long) now.startTime + now.duration, "now runs");
+        assertEquals((long) now.startTime + now.duration, following.startTime, "next follows");
+        assertEquals(List.of(220, (int) stream, now.evtId), next(220));
+        assertTrue(nowExt.itemCount > 0 && now.name.length > 0);
+    }
+
+    @Test
+    @Order(4)
+    void subtitlesAndTeletextOfThePlayingService() throws InterruptedException {
+        Strm.SubtitleContent sc = new Strm.SubtitleContent();
+        dvb.getStrm().Strm_GetSubTilteStreamInfo(0, sc);
+        Subttl sub = dvb.getSubttl();
+        Subttl.SUBTTL_Settings s = new Subttl.SUBTTL_Settings();
+        s.pid = sc.pid;
+        s.langCode = sc.langCode;
+        s.compositionPageId = sc.compositionPageId;
+        s.ancillaryPageId = sc.ancillaryPageId;
+        s.hstrm = stream;
+        long decoder = sub.Subttl_Start(s);
+        int regions = next(240).get(2);
+        while (regions == 0) regions = next(240).get(2);
+        Subttl.SUBTTL_Data_t data = new Subttl.SUBTTL_Data_t();
+        assertEquals(0, sub.Subttl_GetData(decoder, data));
+        assertTrue(data.numRegions > 0 && data.numCluts > 0);
+        Subttl.SUBTTL_Region_t region = new Subttl.SUBTTL_Region_t();
+        sub.Subttl_GetRegionData(0, region);
+        assertEquals(region.i_width * region.i_height, region.p_pixbuf.length);
+        Subttl.SUBTTL_Clut clut = new Subttl.SUBTTL_Clut();
+        sub.Subttl_GetClutData(0, clut);
+        int[] table = region.i_depth == 1 ? clut.c_2b : region.i_depth == 2 ? clut.c_4b : clut.c_8b;
+        Set<Integer> alphas = new TreeSet<>();
+        for (byte p : region.p_pixbuf) alphas.add(table[p & 0xFF] >>> 24);
+        assertTrue(alphas.contains(255) && alphas.size() > 2, "opaque text, anti-aliased: " + alphas);
+        assertEquals(0, sub.Subttl_Stop(decoder));
+
+        Strm.TeletextContent tc = new Strm.TeletextContent();
+        dvb.getStrm().Strm_GetTeleTextStreamInfo(0, tc);
+        Teltxt ttx = dvb.getTeltxt();
+        Teltxt.TELTXT_Settings t = new Teltxt.TELTXT_Settings();
+        t.pid = tc.pid;
+        t.langCode = tc.langCode;
+        t.streamName = "";
+        long page = ttx.Teltxt_Start(t);
+        Teltxt.TELTXT_NavPages nav = new Teltxt.TELTXT_NavPages();
+        assertEquals(0, ttx.Teltxt_SetData(page, 0x100, 0, nav));
+        byte[] image = new byte[8032];
+        ttx.Teltxt_GetData(page, 0, image.length, image);
+        ByteBuffer b = ByteBuffer.wrap(image).order(ByteOrder.LITTLE_ENDIAN);
+        StringBuilder header = new StringBuilder();
+        for (int col = 0; col < 8; col++) header.appendCodePoint(b.getInt(32 + col * 8));
+        assertEquals(List.of(0x100, 1, " P100   "), List.of((int) b.getShort(0), (int) image[7], header.toString()));
+        assertEquals(0, ttx.Teltxt_Stop(page));
+        assertEquals(0, dvb.getStrm().Strm_Close(stream));
+    }
+}
