@@ -22,6 +22,7 @@ enum Result : int32_t {
     kErrNoData = -10,       // nothing to deliver now
     kErrTooMany = -11,      // no free handle
     kErrNoComponent = -12,  // the service has no component with that PID
+    kErrDatabase = -13,     // the event database cannot be opened or written
 };
 
 // Listener events raised by the receiver (msg, ext1, ext2).
@@ -32,6 +33,7 @@ enum EventCode : int {
     kEvtPositioner = 211,    // front end, dish position reached (tenths of a degree)
     kEvtPresent = 220,       // stream handle, id of the new present event
     kEvtSystemReady = 230,   // 0 or a Result, 0
+    kEvtEpgUpdate = 240,     // service id, events stored (or kErrDatabase)
 };
 
 // Front-end type codes of ANT_FrontendParameters.type.
