@@ -22,6 +22,7 @@ enum Result : int32_t {
     kErrNoData = -10,       // nothing to deliver now
     kErrTooMany = -11,      // no free handle
     kErrNoComponent = -12,  // the service has no component with that PID
+    kErrDatabase = -13,     // the event database cannot be opened or written
 };
 
 // Listener events raised by the receiver (msg, ext1, ext2).
@@ -34,6 +35,7 @@ enum EventCode : int {
     kEvtSystemReady = 230,   // 0 or a Result, 0
     kEvtSubtitle = 240,      // subtitle decoder handle, regions of the new display set
     kEvtTeletext = 250,      // teletext decoder handle, page << 16 | subcode of the new sending
+    kEvtEpgUpdate = 260,     // service id, events stored (or kErrDatabase)
 };
 
 // Front-end type codes of ANT_FrontendParameters.type.

@@ -268,11 +268,12 @@ bool EpgDatabase::loadVersions(std::string* error) {
     }
     int rc;
     while ((rc = sqlite3_step(all.get())) == SQLITE_ROW) {
-        int c[6];
-        for (int i = 0; i < 6; ++i) c[i] = sqlite3_column_int(all.get(), i);
+        int c[5];
+        for (int i = 0; i < 5; ++i) c[i] = sqlite3_column_int(all.get(), i);
         ServiceKey key{static_cast<uint16_t>(c[0]), static_cast<uint16_t>(c[1]),
                        static_cast<uint16_t>(c[2])};
-        versions_[sectionId(key, c[3] & 0xFF, c[4] & 0xFF)] = static_cast<uint8_t>(c[5]);
+        versions_[sectionId(key, c[3] & 0xFF, c[4] & 0xFF)] =
+                static_cast<uint32_t>(sqlite3_column_int64(all.get(), 5));
     }
     if (rc == SQLITE_DONE) return true;
     *error = sqlite3_errmsg(db_.get());
@@ -280,7 +281,16 @@ bool EpgDatabase::loadVersions(std::string* error) {
 }
 
 bool EpgDatabase::storeSection(ServiceKey service, uint8_t tableId, uint8_t sectionNumber,
-                               uint8_t version, const std::vector<dvbmodel::Event>& events) {
+                               uint32_t version, const std::vector<dvbmodel::Event>& events) {
+    std::vector<const dvbmodel::Event*> list;
+    list.reserve(events.size());
+    for (const dvbmodel::Event& e : events) list.push_back(&e);
+    return storeSection(service, tableId, sectionNumber, version, list);
+}
+
+bool EpgDatabase::storeSection(ServiceKey service, uint8_t tableId, uint8_t sectionNumber,
+                               uint32_t version,
+                               const std::vector<const dvbmodel::Event*>& events) {
     std::lock_guard<std::mutex> lock(mutex_);
     // A broadcast repeats its sections every few seconds: the same version again costs a look
     // in memory.
@@ -307,8 +317,8 @@ bool EpgDatabase::storeSection(ServiceKey service, uint8_t tableId, uint8_t sect
 
 // Within the store's transaction. A section never stored before has no rows to remove.
 bool EpgDatabase::replaceSection(ServiceKey service, uint8_t tableId, uint8_t sectionNumber,
-                                 uint8_t version, bool stored,
-                                 const std::vector<dvbmodel::Event>& events) {
+                                 uint32_t version, bool stored,
+                                 const std::vector<const dvbmodel::Event*>& events) {
     for (const SqlStatement* del : {&deleteItems_, &deleteEvents_}) {
         if (!stored) break;
         Run d(*del);
@@ -316,7 +326,8 @@ bool EpgDatabase::replaceSection(ServiceKey service, uint8_t tableId, uint8_t se
         if (d.step() != SQLITE_DONE) return fail("removing a section's events");
     }
     std::string nameUtf8, textUtf8;
-    for (const dvbmodel::Event& e : events) {
+    for (const dvbmodel::Event* event : events) {
+        const dvbmodel::Event& e = *event;
         {
             Run ins(insertEvent_);
             sqlite3_stmt* s = *ins;
@@ -356,7 +367,7 @@ bool EpgDatabase::replaceSection(ServiceKey service, uint8_t tableId, uint8_t se
     }
     Run put(putSection_);
     bindSection(*put, service, tableId, sectionNumber);
-    sqlite3_bind_int(*put, 6, version);
+    sqlite3_bind_int64(*put, 6, version);
     return put.step() == SQLITE_DONE || fail("storing the section's version");
 }
 
@@ -436,8 +447,41 @@ size_t EpgDatabase::eventCount() const {
     return static_cast<size_t>(sqlite3_column_int64(*q, 0));
 }
 
+bool EpgDatabase::holds(ServiceKey service, uint8_t tableId, uint8_t sectionNumber,
+                        uint32_t version) const {
+    std::lock_guard<std::mutex> lock(mutex_);
+    auto known = versions_.find(sectionId(service, tableId, sectionNumber));
+    return known != versions_.end() && known->second == version;
+}
+
 bool EpgDatabase::addService(const EpgService& service) {
     std::lock_guard<std::mutex> lock(mutex_);
+    return putService(service);
+}
+
+bool EpgDatabase::setServices(const std::vector<EpgService>& list) {
+    std::lock_guard<std::mutex> lock(mutex_);
+    {
+        Run b(begin_);
+        if (b.step() != SQLITE_DONE) return fail("starting to write the services");
+    }
+    bool ok;
+    {
+        Run clear(clearServices_);
+        ok = clear.step() == SQLITE_DONE || fail("clearing the services");
+    }
+    for (size_t i = 0; ok && i < list.size(); ++i) ok = putService(list[i]);
+    if (ok) {
+        Run c(commit_);
+        if (c.step() == SQLITE_DONE) return true;
+        fail("committing the services");
+    }
+    Run r(rollback_);
+    r.step();
+    return false;
+}
+
+bool EpgDatabase::putService(const EpgService& service) {
     Run q(addService_);
     bindKey(*q, service.key);
     sqlite3_bind_int64(*q, 4, service.tpIndex);

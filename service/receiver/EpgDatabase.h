@@ -68,9 +68,16 @@ public:
     // Stores the events of one EIT section of a service in one transaction. A section seen
     // before with the same version changes nothing; with another version its events replace
     // those that section held, and those only. Returns false on a database error (lastError()
-    // tells it), leaving the database as the last committed store left it.
-    bool storeSection(ServiceKey service, uint8_t tableId, uint8_t sectionNumber, uint8_t version,
+    // tells it), leaving the database as the last committed store left it. A broadcast's
+    // versions are 5 bits; the receiver's own sections use the whole 32.
+    bool storeSection(ServiceKey service, uint8_t tableId, uint8_t sectionNumber, uint32_t version,
                       const std::vector<dvbmodel::Event>& events);
+    // The same for events that stay where they are (the model's own).
+    bool storeSection(ServiceKey service, uint8_t tableId, uint8_t sectionNumber, uint32_t version,
+                      const std::vector<const dvbmodel::Event*>& events);
+
+    // Whether the section is stored with that version.
+    bool holds(ServiceKey service, uint8_t tableId, uint8_t sectionNumber, uint32_t version) const;
 
     // The event of a service running at `time` (start <= time < start + duration), or else the
     // first one that starts after it; with its extended text and items. Nothing on an error.
@@ -85,6 +92,8 @@ public:
     // updates its indexes and keeps its place. Clearing the list keeps the stored events.
     bool addService(const EpgService& service);
     bool clearServices();
+    // Replaces the list with `list`, in one transaction.
+    bool setServices(const std::vector<EpgService>& list);
     std::vector<EpgService> services() const;
 
     // What the last failed call ran into.
@@ -96,11 +105,13 @@ private:
     bool prepareAll(std::string* error);
     bool loadVersions(std::string* error);
     bool fail(const char* what) const;
-    bool replaceSection(ServiceKey service, uint8_t tableId, uint8_t sectionNumber, uint8_t version,
-                        bool stored, const std::vector<dvbmodel::Event>& events);
+    bool replaceSection(ServiceKey service, uint8_t tableId, uint8_t sectionNumber,
+                        uint32_t version, bool stored,
+                        const std::vector<const dvbmodel::Event*>& events);
     std::optional<dvbmodel::Event> readOne(sqlite3_stmt* stmt, ServiceKey service,
                                            int64_t time) const;
     bool readItems(ServiceKey service, sqlite3_stmt* row, dvbmodel::Event& event) const;
+    bool putService(const EpgService& service);
 
     struct Close {
         void operator()(sqlite3* db) const;
@@ -114,7 +125,7 @@ private:
     SqlStatement begin_, commit_, rollback_;
     // The version of every stored section, as the section table holds it (the receiver is the
     // file's one writer): a section that comes round again costs no query.
-    std::unordered_map<uint64_t, uint8_t> versions_;
+    std::unordered_map<uint64_t, uint32_t> versions_;
     SqlStatement deleteItems_, deleteEvents_, insertEvent_, insertItem_, putSection_;
     SqlStatement runningAt_, startingAfter_, startingIn_, itemsOf_, count_;
     SqlStatement addService_, clearServices_, listServices_;

@@ -170,8 +170,11 @@ void Receiver::run() {
         lock.unlock();
         for (const auto& e : events) mSink(e[0], e[1], e[2]);
         lock.lock();
-        mSyncDone = asked;
-        mSynced.notify_all();
+        // Caught up only once the tasks that tasks posted have run too.
+        if (mTasks.empty()) {
+            mSyncDone = asked;
+            mSynced.notify_all();
+        }
         if (mPokes != pokes) continue;
         auto delay = mClock.realDelay(now + kTickMillis);
         if (delay == std::chrono::steady_clock::duration::max()) {
@@ -189,6 +192,11 @@ void Receiver::run() {
 std::vector<std::array<int, 3>> Receiver::collectEvents(int64_t now) {
     std::vector<std::array<int, 3>> out = std::move(mQueued);
     mQueued.clear();
+    // A new day moves every schedule section by one day: store them again.
+    if (epg != nullptr && mEpgDay >= 0 && now / 86400000 != mEpgDay) {
+        mEpgDay = -1;
+        requestEpgSync();
+    }
     for (int i = 0; i < kFrontends; ++i) {
         Frontend& fe = frontends[i];
         if (fe.lostPending) {

@@ -16,6 +16,7 @@
 #include <map>
 #include <memory>
 #include <mutex>
+#include <set>
 #include <string>
 #include <thread>
 #include <vector>
@@ -24,12 +25,15 @@
 #include "../broadcast/Broadcast.h"
 #include "Clock.h"
 #include "Codes.h"
+#include "EpgDatabase.h"
 
 namespace dvbrx {
 
 constexpr int kFrontends = 2;
 // Open handles of each kind (scans, streams, decoders) at once.
 constexpr size_t kMaxHandles = 16;
+// Services the event collection keeps at most.
+constexpr size_t kMaxEpgServices = 1024;
 // The dish motor: its speed, its mechanical travel either side of due south, and how far off a
 // satellite it may point and still receive it.
 constexpr double kMotorDegreesPerSecond = 1.5;
@@ -125,6 +129,10 @@ struct Stream {
     // `shiftPos` (ms into the recording) at `shiftAt` on, at playSpeed / playSpeedDiv.
     bool shifting = false;
     int64_t shiftSince = 0, shiftPos = 0, shiftAt = 0;
+    // EPG_GetEvent's cursor: the service it walks and the start of the event it gave last.
+    bool epgWalking = false;
+    ServiceKey epgService;
+    int64_t epgLast = 0;
 };
 
 // What a decoder last reported: the sending (a display set, a teletext page) of a timed list
@@ -193,8 +201,15 @@ public:
     std::map<int32_t, Scan> scans;
     std::map<int32_t, Stream> streams;
     std::map<int32_t, Decoder> subtitles, teletexts;
-    std::vector<EpgSvc> epgServices;
     int32_t nextHandle = 1;
+    // The services whose events are collected, in the order added; the database keeps a copy.
+    std::vector<EpgSvc> epgServices;
+    // EpgMd_ClearService ran since the database was last opened: the list it holds is void.
+    bool epgCleared = false;
+    // The open event database (null before Dvb_SystemInit opens it, and after
+    // Dvb_SystemUnInit) and its path.
+    std::shared_ptr<EpgDatabase> epg;
+    std::string epgPath;
 
     // What `params` deliver at `now` when tuned at `tunedAt`. With `pickBand` the receiver
     // sets the 22 kHz tone and the polarisation itself (scans that follow a NIT or sweep a
@@ -231,6 +246,19 @@ public:
     // service's own.
     int64_t ptsAt(const Stream& s, int64_t from, int64_t ms) const;
 
+    // ---- event database (ReceiverEpg.cpp), on the service thread ----------------------
+    // Opens the database at `path` (an open one at the same path stays), takes the services
+    // it lists as collected unless EpgMd_ClearService ran since, and stores their schedules.
+    // Raises kEvtSystemReady with 0 or kErrDatabase.
+    void openEpg(const std::string& path);
+    void closeEpg();
+    // Writes the list of collected services to the database and stores the schedule of each
+    // one not stored yet today; raises kEvtEpgUpdate for each service whose store committed.
+    void syncEpg();
+    // Asks the service thread for a syncEpg() (once, however often asked before it runs).
+    // Called under mLock.
+    void requestEpgSync();
+
     // Present and following events of `service` at `now` (null where there is none).
     static const dvbmodel::Event* eventAt(const dvbmodel::Service& service, int64_t seconds);
     static const dvbmodel::Event* eventAfter(const dvbmodel::Service& service, int64_t seconds);
@@ -250,9 +278,36 @@ private:
     std::vector<std::array<int, 3>> mQueued;
     uint64_t mSyncAsked = 0, mSyncDone = 0, mPokes = 0;
     std::condition_variable mSynced;
+    // Service thread only: the services whose schedule is in the open database, and the day
+    // (since 1970) they were stored on; a new day stores them again.
+    std::set<uint64_t> mEpgStored;
+    int64_t mEpgDay = -1;
+    bool mEpgSyncPending = false;  // under mLock
     bool mStop = false;
     std::thread mThread;
 };
+
+// How the receiver stores a service's schedule: one section per day from `today` (UTC
+// seconds at midnight), as the first section of the day's first EIT schedule segment (table
+// 0x50 for days 0-3, 0x51 for days 4-7, section 0, 64, 128 or 192), every one of the 8 days
+// even where it has no event; events outside the 8 days are left out. A section's version is
+// a fingerprint of its day and events: the same schedule again stores nothing.
+struct ScheduleSection {
+    uint8_t tableId = 0, number = 0;
+    uint32_t version = 0;
+    std::vector<const dvbmodel::Event*> events;
+};
+constexpr int kEpgDays = 8;
+std::array<ScheduleSection, kEpgDays> scheduleSections(const dvbmodel::Service& service,
+                                                       int64_t today);
+// Stores those that the database does not hold yet for `key`, one transaction each. A failed
+// store ends it; the sections stored before stay.
+struct ScheduleStore {
+    int sections = 0, events = 0;  // stored
+    bool failed = false;
+};
+ScheduleStore storeSchedule(EpgDatabase& db, ServiceKey key, const dvbmodel::Service& service,
+                            int64_t today);
 
 // The broadcast the process's receiver plays.
 dvbmodel::Broadcast defaultBroadcast(int64_t start);

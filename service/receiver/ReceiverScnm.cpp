@@ -1,5 +1,4 @@
 // The scan module: channel searches on a front end, their result lists, system start-up.
-#include <fcntl.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -314,30 +313,30 @@ int32_t ReceiverScnm::Dvb_SystemInit(const DVB_Config* config) {
     if (access(path.c_str(), F_OK) == 0 ? access(path.c_str(), W_OK) != 0
                                         : access(dir.c_str(), W_OK) != 0)
         return kErrPath;
-    // The file appears shortly after, from the service thread, as the device's start-up makes
-    // it; the event database opens it later.
-    // The task runs on the receiver's own thread, which ends before the receiver does.
+    // The service thread makes the file shortly after, as the device's start-up does, and
+    // keeps the database open; it runs on the receiver's own thread, which ends before the
+    // receiver does.
     Receiver* rx = mRx.get();
-    rx->post([rx, path] {
-        int fd = open(path.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0644);
-        if (fd >= 0) close(fd);
-        std::lock_guard<std::mutex> lock(rx->mLock);
-        rx->queueEvent(kEvtSystemReady, fd >= 0 ? kOk : kErrPath, 0);
-    });
+    rx->post([rx, path] { rx->openEpg(path); });
     return kOk;
 }
 
 int32_t ReceiverScnm::Dvb_SystemUnInit(const DVB_Config* config) {
     if (config == nullptr) return kErrBadParameter;
-    std::lock_guard<std::mutex> lock(mRx->mLock);
-    int64_t now = mRx->clock().nowMillis();
-    for (auto& entry : mRx->scans) {
-        Scan& scan = entry.second;
-        if (scan.state == kScanRunning && scan.stepsDone(now) < scan.steps.size()) {
-            scan.state = kScanStopped;
-            scan.stoppedAt = now;
+    {
+        std::lock_guard<std::mutex> lock(mRx->mLock);
+        int64_t now = mRx->clock().nowMillis();
+        for (auto& entry : mRx->scans) {
+            Scan& scan = entry.second;
+            if (scan.state == kScanRunning && scan.stepsDone(now) < scan.steps.size()) {
+                scan.state = kScanStopped;
+                scan.stoppedAt = now;
+            }
         }
     }
+    // The database closes after the stores already asked for.
+    Receiver* rx = mRx.get();
+    rx->post([rx] { rx->closeEpg(); });
     return kOk;
 }
 

@@ -11,8 +11,6 @@ namespace {
 constexpr int64_t kAudioFrameTicks = 2160;
 // Bit rates of a time-shift recording, bits per second.
 constexpr int64_t kTvBitRate = 4000000, kRadioBitRate = 192000;
-// Services the event collection keeps at most.
-constexpr size_t kMaxEpgServices = 1024;
 
 void fillEvent(const dvbmodel::Event& ev, uint8_t runStatus, EpgEvent* e, ExtEpgEvent* x) {
     e->evtId = ev.id;
@@ -323,7 +321,12 @@ int32_t ReceiverStrm::CheckService(const ServiceCheck* check) {
                 std::abs(check->satPosition - t.orbitalPosition) > 3)
                 continue;
             for (const auto& svc : tp.services) {
-                if (svc.id == check->sid) return kOk;
+                if (svc.id != check->sid) continue;
+                // On the air there; its guide is ready when the database has its events.
+                int64_t now = mRx->clock().nowSeconds();
+                bool guide = mRx->epg != nullptr &&
+                             mRx->epg->eventAt({tp.onid, tp.tsid, svc.id}, now).has_value();
+                return guide ? kOk : kErrNoData;
             }
         }
     }
@@ -334,18 +337,24 @@ int32_t ReceiverStrm::EPG_GetEvent(const EpgSvc* service, int32_t handle, EpgEve
                                    ExtEpgEvent* ext) {
     std::lock_guard<std::mutex> lock(mRx->mLock);
     if (service == nullptr || event == nullptr || ext == nullptr) return kErrBadParameter;
-    if (mRx->streams.count(handle) == 0) return kErrBadHandle;
-    const auto* svc = mRx->findService(service->onId, service->tsId, service->svcId);
-    if (svc == nullptr) return kErrNoService;
-    int64_t seconds = mRx->clock().nowSeconds();
-    const auto* ev = Receiver::eventAt(*svc, seconds);
-    uint8_t running = 4;
-    if (ev == nullptr) {
-        ev = Receiver::eventAfter(*svc, seconds);
-        running = 1;
-    }
-    if (ev == nullptr) return kErrNoData;
-    fillEvent(*ev, running, event, ext);
+    auto it = mRx->streams.find(handle);
+    if (it == mRx->streams.end()) return kErrBadHandle;
+    if (mRx->epg == nullptr) return kErrNotStarted;
+    Stream& s = it->second;
+    ServiceKey key{service->onId, service->tsId, service->svcId};
+    int64_t now = mRx->clock().nowSeconds();
+    // Each handle walks one service's schedule: the event running now (or the next) first,
+    // then on each call the one that starts after the last given. Another service, or the
+    // end of the walk, starts over.
+    bool walking = s.epgWalking && s.epgService == key;
+    std::optional<dvbmodel::Event> ev =
+            walking ? mRx->epg->nextAfter(key, s.epgLast) : mRx->epg->eventAt(key, now);
+    s.epgWalking = ev.has_value();
+    if (!ev) return kErrNoData;
+    s.epgService = key;
+    s.epgLast = ev->start;
+    bool running = ev->start <= now && now < ev->start + static_cast<int64_t>(ev->duration);
+    fillEvent(*ev, running ? 4 : 1, event, ext);
     return kOk;
 }
 
@@ -355,18 +364,26 @@ int32_t ReceiverStrm::EpgMd_AddService(const EpgSvc* service) {
     if (mRx->findService(service->onId, service->tsId, service->svcId) == nullptr)
         return kErrNoService;
     auto& list = mRx->epgServices;
-    for (const EpgSvc& e : list) {
-        if (e.svcId == service->svcId && e.tsId == service->tsId && e.onId == service->onId)
-            return kOk;
+    auto same = [service](const EpgSvc& e) {
+        return e.svcId == service->svcId && e.tsId == service->tsId && e.onId == service->onId;
+    };
+    auto known = std::find_if(list.begin(), list.end(), same);
+    if (known != list.end()) {
+        *known = *service;  // new indexes, same place
+    } else if (list.size() >= kMaxEpgServices) {
+        return kErrTooMany;
+    } else {
+        list.push_back(*service);
     }
-    if (list.size() >= kMaxEpgServices) return kErrTooMany;
-    list.push_back(*service);
+    mRx->requestEpgSync();
     return kOk;
 }
 
 int32_t ReceiverStrm::EpgMd_ClearService() {
     std::lock_guard<std::mutex> lock(mRx->mLock);
     mRx->epgServices.clear();
+    mRx->epgCleared = true;
+    mRx->requestEpgSync();
     return kOk;
 }
 

@@ -1,17 +1,24 @@
+#include <broadcast/Builtin.h>
+#include <broadcast/DvbText.h>
 #include <gtest/gtest.h>
 #include <receiver/Modules.h>
 
+#include <sys/stat.h>
 #include <unistd.h>
 #include <algorithm>
 #include <cmath>
 #include <cstdlib>
+#include <fstream>
 #include <mutex>
 #include <set>
+#include <tuple>
 #include <vector>
 
 using namespace dvbrx;
 
 namespace {
+
+using Events = std::vector<std::array<int, 3>>;
 
 constexpr int64_t kStart = 1709323200000;  // 2024-03-01T20:00:00Z
 
@@ -57,19 +64,33 @@ ANT_FrontendParameters with(ANT_FrontendParameters p, F change) {
 
 class ReceiverTest : public ::testing::Test {
 protected:
-    ReceiverTest() {
+    ReceiverTest() { start(fallbackBroadcast(kStart / 1000)); }
+
+    // A receiver process of its own: a second call ends the first.
+    void start(dvbmodel::Broadcast broadcast) {
+        cfg.clear(), scnm.clear(), strm.clear(), teltxt.clear(), rx.reset();
         Clock::Settings clock{true, kStart, 0.0, 7};
-        rx = std::make_shared<Receiver>(fallbackBroadcast(kStart / 1000), clock,
-                                        [this](int msg, int a, int b) {
-                                            std::lock_guard<std::mutex> lock(eventLock);
-                                            events.push_back({msg, a, b});
-                                        });
+        rx = std::make_shared<Receiver>(std::move(broadcast), clock, [this](int msg, int a, int b) {
+            std::lock_guard<std::mutex> lock(eventLock);
+            events.push_back({msg, a, b});
+        });
         cfg = new ReceiverCfg(rx);
         scnm = new ReceiverScnm(rx);
         strm = new ReceiverStrm(rx);
         teltxt = new ReceiverTeltxt(rx);
     }
 
+    int32_t systemInit(const std::string& path) {
+        setenv("DVB_EPG_DB", path.c_str(), 1);
+        DVB_Config config{};
+        int32_t result = scnm->Dvb_SystemInit(&config);
+        unsetenv("DVB_EPG_DB");
+        rx->sync();
+        return result;
+    }
+    static void wipe(const std::string& path) {
+        for (const char* s : {"", "-wal", "-shm"}) remove((path + s).c_str());
+    }
     void advance(int64_t ms) {
         rx->clock().advance(ms);
         rx->sync();
@@ -463,19 +484,98 @@ TEST_F(ReceiverTest, BadInputGetsItsResult) {
     EXPECT_EQ(list, nullptr);
 }
 
-TEST_F(ReceiverTest, SystemInitCreatesTheDatabaseFileFromTheServiceThread) {
+TEST_F(ReceiverTest, SystemInitOpensTheDatabaseFromTheServiceThreadOrSaysWhyNot) {
     std::string path = ::testing::TempDir() + "receiver-epg.db";
-    remove(path.c_str());
-    DVB_Config config{};
-    setenv("DVB_EPG_DB", "/nonexistent/dir/epg.db", 1);
-    EXPECT_EQ(scnm->Dvb_SystemInit(&config), kErrPath);
-    setenv("DVB_EPG_DB", path.c_str(), 1);
-    EXPECT_EQ(scnm->Dvb_SystemInit(&config), kOk);
-    rx->sync();
-    unsetenv("DVB_EPG_DB");
+    std::string folder = path + ".d", text = path + ".txt";
+    wipe(path);
+    mkdir(folder.c_str(), 0755);
+    std::ofstream(text) << "not a database\n";
+    const struct {
+        std::string path;
+        int32_t result;
+        Events ready;
+    } cases[] = {{"/nonexistent/dir/epg.db", kErrPath, {}},
+                 {folder, kOk, {{kEvtSystemReady, kErrDatabase, 0}}},
+                 {text, kOk, {{kEvtSystemReady, kErrDatabase, 0}}},
+                 {path, kOk, {{kEvtSystemReady, 0, 0}}}};
+    for (const auto& c : cases) {
+        EXPECT_EQ(systemInit(c.path), c.result) << c.path;
+        EXPECT_EQ(take(kEvtSystemReady), c.ready) << c.path;
+    }
     EXPECT_EQ(access(path.c_str(), F_OK), 0);
-    EXPECT_EQ(take(kEvtSystemReady), (std::vector<std::array<int, 3>>{{kEvtSystemReady, 0, 0}}));
-    remove(path.c_str());
+    rmdir(folder.c_str());
+    remove(text.c_str());
+}
+
+// A service of each satellite: 158 and 156 events in the week, 21 and 24 on its first day.
+const EpgSvc kKanal{0x2801, 1011, 1, {}, 0, 0, 0}, kGunes{0x3101, 12400, 318, {}, 0, 0, 0};
+
+TEST_F(ReceiverTest, CollectedServicesFillTheEventDatabaseOnceAndSurviveARestart) {
+    std::string path = ::testing::TempDir() + "receiver-epg-fill.db";
+    wipe(path);
+    start(dvbmodel::builtinBroadcast(kStart / 1000));
+    STRM_OpenSettings open{};
+    int32_t h = strm->Open(&open);
+    EpgEvent ev{};
+    ExtEpgEvent ext{};
+    auto get = [&](const EpgSvc& svc) { return strm->EPG_GetEvent(&svc, h, &ev, &ext); };
+    EXPECT_EQ(get(kKanal), kErrNotStarted);
+    EpgSvc unknown{0x2899, 1011, 1, {}, 0, 0, 0};
+    EXPECT_EQ(strm->EpgMd_AddService(&unknown), kErrNoService);
+    ASSERT_EQ(strm->EpgMd_AddService(&kKanal), kOk);  // kept for the database to come
+    ASSERT_EQ(systemInit(path), kOk);
+    ASSERT_EQ(strm->EpgMd_AddService(&kGunes), kOk);
+    ASSERT_EQ(strm->EpgMd_AddService(&kKanal), kOk);  // again: nothing new to store
+    rx->sync();
+    EXPECT_EQ(take(kEvtEpgUpdate),
+              (Events{{kEvtEpgUpdate, 0x2801, 158}, {kEvtEpgUpdate, 0x3101, 156}}));
+    EXPECT_EQ(rx->epg->eventCount(), 314u);
+
+    // The event running now, then on each call the next one of the same service.
+    ASSERT_EQ(get(kKanal), kOk);
+    EXPECT_EQ(std::tie(ev.evtId, ev.startTime, ev.duration, ev.runStatus, ev.parentalRating,
+                       ev.content, ev.extendedFlag, ext.itemCount),
+              std::make_tuple(18, 1709322900, 6600, 4, 9, 0x13, 1, 3u));
+    EXPECT_STREQ(ev.name, "Der letzte Zug nach S\xC8uden");
+    EXPECT_STREQ(ev.text, "Drama, zwei Fremde auf einer langen Reise.");
+    EXPECT_STREQ(ext.items[1].itemText, "Felix Wagner, Anna Berger");
+    EXPECT_STREQ(ext.text,  // a string in Java: decoded
+                 "Ein Winterabend, ein verspäteter Zug und eine Begegnung, die alles ändert. Ein "
+                 "Film von Sofia Marino.");
+    ASSERT_EQ(get(kKanal), kOk);
+    EXPECT_EQ(std::tie(ev.evtId, ev.startTime, ev.runStatus), std::make_tuple(19, 1709329500, 1));
+    ASSERT_EQ(get(kGunes), kOk);  // another service starts at now
+    int walked = 1;
+    int64_t end = 1709326200;
+    for (; walked < 200 && get(kGunes) == kOk; ++walked) {
+        EXPECT_EQ(ev.startTime, end);
+        end = int64_t{ev.startTime} + ev.duration;
+    }
+    EXPECT_EQ(walked, 156 - 19);
+    EXPECT_EQ(end, 1709856000);   // the end of the week's schedule
+    ASSERT_EQ(get(kGunes), kOk);  // after the end, from now again
+    EXPECT_EQ(ev.evtId, 20);
+
+    ServiceCheck collected{192, 11362000, 1011, 0x2801}, notCollected{192, 11362000, 1011, 0x2802},
+            elsewhere{130, 11362000, 1011, 0x2801};
+    EXPECT_EQ(strm->CheckService(&collected), kOk);
+    EXPECT_EQ(strm->CheckService(&notCollected), kErrNoData);  // on the air there
+    EXPECT_EQ(strm->CheckService(&elsewhere), kErrNoService);
+
+    start(dvbmodel::builtinBroadcast(kStart / 1000));
+    ASSERT_EQ(systemInit(path), kOk);
+    EXPECT_EQ(take(kEvtEpgUpdate), Events{});  // the list is back, nothing new
+    EXPECT_EQ(rx->epg->services().size(), 2u);
+    // A new day moves every section by a day: the past day's events go.
+    advance(4 * 3600 * 1000);
+    EXPECT_EQ(take(kEvtEpgUpdate),
+              (Events{{kEvtEpgUpdate, 0x2801, 137}, {kEvtEpgUpdate, 0x3101, 132}}));
+    EXPECT_EQ(rx->epg->eventCount(), 269u);
+    ASSERT_EQ(strm->EpgMd_ClearService(), kOk);
+    rx->sync();
+    EXPECT_EQ(rx->epg->services().size(), 0u);
+    EXPECT_EQ(rx->epg->eventCount(), 269u);  // clearing the list keeps the events
+    wipe(path);
 }
 
 }  // namespace
