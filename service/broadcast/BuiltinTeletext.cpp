@@ -223,7 +223,7 @@ TeletextPage newsPage(std::string_view title, bool german, int64_t start, int64_
     PageBuilder p(0x101, german);
     p.put(1, 0, {kRed, kNewBackground, kWhite});
     p.text(1, 4, p.pick({"NACHRICHTEN", "NEWS"}));
-    char counter[8];
+    char counter[16];  // "1/3": room for any int, which the compiler cannot rule out
     snprintf(counter, sizeof counter, "%d/3", story + 1);
     p.text(1, 36, counter);
     p.line(3, 0, kDoubleHeight, p.pick(kNews[story][0]));
