@@ -294,6 +294,23 @@ jbyteArray Spy_cacheEntry(JNIEnv* env, jclass, jstring symbol, jint index, jint 
     return toBytes(env, base + int64_t{index} * size, size);
 }
 
+// The exported module callbacks Strmcallback and Subttlcallback, called with some arguments: what
+// each answers.
+jintArray Spy_callbacks(JNIEnv* env, jclass) {
+    void* lib = dlopen("libDVBjni.so", RTLD_NOW | RTLD_NOLOAD);
+    if (lib == nullptr) return nullptr;
+    jint got[2];
+    const char* names[] = {"_Z12StrmcallbackPvii", "_Z14SubttlcallbackPvii"};
+    for (int i = 0; i < 2; ++i) {
+        auto fn = reinterpret_cast<int (*)(void*, int, int)>(dlsym(lib, names[i]));
+        got[i] = fn != nullptr ? fn(lib, -1, 7) : -99;  // -99: not exported
+    }
+    dlclose(lib);
+    jintArray a = env->NewIntArray(2);
+    if (a != nullptr) env->SetIntArrayRegion(a, 0, 2, got);
+    return a;
+}
+
 jint Spy_pointerSize(JNIEnv*, jclass) {
     return static_cast<jint>(sizeof(void*));
 }
@@ -320,6 +337,7 @@ const JNINativeMethod gMethods[] = {
                                Spy_takeGlobalRefEvents),
         MAKE_JNI_NATIVE_METHOD("trackGlobalRefs", "()V", Spy_trackGlobalRefs),
         MAKE_JNI_NATIVE_METHOD("pointerSize", "()I", Spy_pointerSize),
+        MAKE_JNI_NATIVE_METHOD("callbacks", "()[I", Spy_callbacks),
         MAKE_JNI_NATIVE_METHOD("callOnLoad", "()I", Spy_callOnLoad),
         MAKE_JNI_NATIVE_METHOD("cacheEntry", "(Ljava/lang/String;II)[B", Spy_cacheEntry),
 };

@@ -37,6 +37,7 @@ class DvbTest extends SpyTestBase {
 
     @Test
     void loadRegistersEveryClassAndReturnsVersion14() {
+        assertArrayEquals(new int[] {0, 0}, Spy.callbacks(), "the exported callbacks answer 0");
         assertEquals(0x00010004, Spy.callOnLoad());
         assertEquals(List.of("2 DVB register_android_dvb_DVB was called",
                 "2 CFG register_android_dvb_Cfg was called"), List.of(Spy.takeLogs()));

@@ -29,6 +29,7 @@ final class Spy {
     static native String[] takeGlobalRefEvents();
     static native void trackGlobalRefs();
     static native int pointerSize();
+    static native int[] callbacks();
     static native int callOnLoad();
     static native byte[] cacheEntry(String symbol, int index, int size);
 }
