@@ -34,7 +34,7 @@
 namespace fuzz {
 
 // The interface headers pin every record member with DVB_RECORD_FIELD. Read here, the same
-// lines give the oracle each member's place, width and sign, apart from the library's maps.
+// lines tell the oracle each member's place, width and sign, apart from the library's maps.
 struct Member {
     uint32_t offset, width, unit;  // unit: of an array's element
     bool isSigned;
@@ -109,13 +109,12 @@ struct Value {
 
 struct Object {
     Kind kind;
-    std::string cls;       // of a class or an instance
-    std::u16string chars;  // of a string
-    std::vector<jbyte> bytes;
-    std::vector<jint> ints;
-    const void* from = nullptr;        // where a byte array's bytes were copied from
-    std::map<std::string, Value> set;  // the fields the library set
-    bool deleted = false;              // its local reference was deleted
+    std::string cls;                        // of a class or an instance
+    std::u16string chars = {};              // of a string
+    std::string data = {};                  // an array's elements
+    const void* from = nullptr;             // where they were copied from
+    std::map<std::string, Value> set = {};  // the fields the library set
+    bool deleted = false;                   // its local reference was deleted
 };
 
 // An out-record of the fake module: where the library holds it, and what Java must see of it.
@@ -155,16 +154,15 @@ inline void enter(JNIEnv* e) {
 
 inline Object* make(JNIEnv* e, Kind kind, const char* cls = "") {
     enter(e);
-    Object* o = now.objects.emplace_back(new Object).get();
-    o->kind = kind;
-    o->cls = cls;
-    return *now.live.insert(o).first, o;
+    Object* o = now.objects.emplace_back(new Object{kind, cls}).get();
+    now.live.insert(o);
+    return o;
 }
 
-// The object behind a live local reference of `kind`, or of any kind: anything else is misuse.
-inline Object* live(const void* ref, int kind = -1) {
+// The object behind a live local reference (of `kind`): anything else is misuse.
+inline Object* live(const void* ref, std::optional<Kind> kind = std::nullopt) {
     auto* o = static_cast<Object*>(const_cast<void*>(ref));
-    FUZZ_CHECK(now.live.count(o) != 0 && !o->deleted && (kind < 0 || int(o->kind) == kind));
+    FUZZ_CHECK(now.live.count(o) != 0 && !o->deleted && (!kind || o->kind == *kind));
     return o;
 }
 
@@ -172,7 +170,7 @@ inline Object* live(const void* ref, int kind = -1) {
 inline const std::string& field(JNIEnv* e, jobject instance, jfieldID id, const std::string& sig) {
     enter(e);
     const auto* f = reinterpret_cast<const Native*>(id);
-    FUZZ_CHECK(f != nullptr && f->cls == live(instance, int(Kind::Instance))->cls);
+    FUZZ_CHECK(f != nullptr && f->cls == live(instance, Kind::Instance)->cls);
     FUZZ_CHECK(f->signature == sig || (sig == "L" && strchr("L[", f->signature[0]) != nullptr));
     return f->name;
 }
@@ -199,23 +197,25 @@ inline void set(JNIEnv* e, jobject instance, jfieldID id, Value v) {
 inline Object* newArray(JNIEnv* e, Kind kind, jsize n) {
     FUZZ_CHECK(n >= 0 && n <= (1 << 24));
     Object* a = make(e, kind);
-    kind == Kind::ByteArray ? a->bytes.resize(n) : a->ints.resize(n);
+    a->data.resize(kind == Kind::ByteArray ? n : 4 * size_t(n));
     return a;
 }
 
 // A region outside the array is misuse here: the library never relies on the VM's
 // ArrayIndexOutOfBoundsException on these paths.
-template <typename T>
-void setRegion(JNIEnv* e, Object* a, std::vector<T>& to, jsize start, jsize n, const T* from) {
+template <typename A, typename T>
+void setRegion(JNIEnv* e, A array, jsize start, jsize n, const T* from) {
     enter(e);
-    FUZZ_CHECK(start >= 0 && n >= 0 && jlong{start} + n <= static_cast<jlong>(to.size()));
-    if (n != 0) memcpy(&to[start], from, n * sizeof(T));
+    Object* a = live(array, sizeof(T) == 1 ? Kind::ByteArray : Kind::IntArray);
+    FUZZ_CHECK(start >= 0 && n >= 0 && (jlong{start} + n) * sizeof(T) <= a->data.size());
+    if (n != 0) memcpy(&a->data[start * sizeof(T)], from, n * sizeof(T));
     a->from = from;
 }
 
 inline jstring newString(JNIEnv* e, const std::u16string& chars) {
     Object* s = make(e, Kind::String);
-    return s->chars = chars, reinterpret_cast<jstring>(s);
+    s->chars = chars;
+    return reinterpret_cast<jstring>(s);
 }
 
 // AddressSanitizer bounds the walk to the zero byte.
@@ -227,13 +227,13 @@ inline jstring newStringUtf(JNIEnv* e, const char* utf) {
 
 inline jint throwNew(JNIEnv* e, jclass cls, const char* message) {
     enter(e);  // never over a pending exception
-    now.thrown = live(cls, int(Kind::Class))->cls + ": " + (message != nullptr ? message : "");
+    now.thrown = live(cls, Kind::Class)->cls + ": " + (message != nullptr ? message : "");
     return JNI_OK;
 }
 
 inline jfieldID fieldId(JNIEnv* e, jclass cls, const char* name, const char* sig) {
     enter(e);
-    Native f{live(cls, int(Kind::Class))->cls, name, sig, nullptr};
+    Native f{live(cls, Kind::Class)->cls, name, sig, nullptr};
     auto it = std::find_if(gFields.begin(), gFields.end(), [&](const Native& g) {
         return g.cls == f.cls && g.name == name && g.signature == sig;
     });
@@ -242,8 +242,9 @@ inline jfieldID fieldId(JNIEnv* e, jclass cls, const char* name, const char* sig
 
 inline jint registerNatives(JNIEnv* e, jclass cls, const JNINativeMethod* m, jint n) {
     enter(e);
-    for (jint i = 0; i < n; ++i)
-        gNatives.push_back({live(cls)->cls, m[i].name, m[i].signature, m[i].fnPtr});
+    for (const JNINativeMethod* end = m + n; m != end; ++m) {
+        gNatives.push_back({live(cls)->cls, m->name, m->signature, m->fnPtr});
+    }
     return JNI_OK;
 }
 
@@ -254,7 +255,9 @@ inline JNIEnv* jni() {
     t.FindClass = [](JNIEnv* e, const char* name) { return jclass(make(e, Kind::Class, name)); };
     t.ThrowNew = throwNew;
     t.ExceptionCheck = [](JNIEnv*) -> jboolean { return !now.thrown.empty(); };
-    t.DeleteLocalRef = [](JNIEnv*, jobject ref) { ref == nullptr || (live(ref)->deleted = true); };
+    t.DeleteLocalRef = [](JNIEnv*, jobject ref) {
+        if (ref != nullptr) live(ref)->deleted = true;
+    };
     t.GetFieldID = fieldId;
     t.GetIntField = [](JNIEnv* e, jobject o, jfieldID id) { return jint(read(e, o, id, 'I')); };
     t.GetLongField = [](JNIEnv* e, jobject o, jfieldID id) { return read(e, o, id, 'J'); };
@@ -274,12 +277,8 @@ inline JNIEnv* jni() {
     t.NewStringUTF = newStringUtf;
     t.NewByteArray = [](JNIEnv* e, jsize n) { return jbyteArray(newArray(e, Kind::ByteArray, n)); };
     t.NewIntArray = [](JNIEnv* e, jsize n) { return jintArray(newArray(e, Kind::IntArray, n)); };
-    t.SetByteArrayRegion = [](JNIEnv* e, jbyteArray a, jsize at, jsize n, const jbyte* from) {
-        setRegion(e, live(a, int(Kind::ByteArray)), live(a)->bytes, at, n, from);
-    };
-    t.SetIntArrayRegion = [](JNIEnv* e, jintArray a, jsize at, jsize n, const jint* from) {
-        setRegion(e, live(a, int(Kind::IntArray)), live(a)->ints, at, n, from);
-    };
+    t.SetByteArrayRegion = setRegion<jbyteArray, jbyte>;
+    t.SetIntArrayRegion = setRegion<jintArray, jint>;
     t.RegisterNatives = registerNatives;
     gJni.functions = &gTable;
     return &gJni;
@@ -328,8 +327,9 @@ template <typename T, size_t N>
 T* shadow(T (&cache)[N]) {
     auto s =
             std::find_if(shadows.begin(), shadows.end(), [&](auto& s) { return s.cache == cache; });
-    if (s == shadows.end())
+    if (s == shadows.end()) {
         s = shadows.insert(s, {cache, std::shared_ptr<T[]>(new T[N]()), sizeof cache});
+    }
     return static_cast<T*>(s->copy.get());
 }
 
@@ -339,17 +339,17 @@ inline void zeroCaches() {
 
 // ---- the oracle ---------------------------------------------------------------------------
 
-// What a module class's Java objects take from the records: for each class, the record it
-// reads when that is not of its own name, and how many fields it sets; Java fields named other
-// than their members ("Class.field"), strings that are null when empty, byte arrays of a
-// whole field rather than its text.
+// What a module class's Java objects take from records: how many fields each class sets; the
+// record it reads where that has another name; Java fields named other than their members
+// ("Class.field"); strings that are null when empty; byte arrays of a whole field rather than
+// of its text.
 struct Mapping {
-    std::map<std::string, std::string> records, renamed;
     std::map<std::string, size_t> counts;
-    std::set<std::string> nullable, whole;
+    std::map<std::string, std::string> records = {}, renamed = {};
+    std::set<std::string> nullable = {}, whole = {};
 };
 
-// The member of `record` behind Java field `name`: the member of that name, one in a nested
+// The member of `record` behind Java field `name`: the member of that name, one of a nested
 // record, or for "name<k>" element k of the array member `name`.
 inline std::optional<Member> memberOf(const std::string& record, const std::string& name) {
     auto& members = gRecords[record];
@@ -368,40 +368,41 @@ inline std::optional<Member> memberOf(const std::string& record, const std::stri
     return element.width = element.unit, element;
 }
 
-// Every field set in `out` (but `skip`), as the record at `rec` holds it under `map`; each
-// byte array copied from `at`, where the library held the record.
+// Every field set in `out` (but `skip`) as the record at `rec` holds it, by `map`; each array
+// copied from `at`, where the library held the record.
 inline void expectFields(jobject out, const std::string& cls, const void* rec, const void* at,
-                         const Mapping& map, std::set<std::string> skip = {}) {
+                         const Mapping& map, const std::set<std::string>& skip = {}) {
     const std::string record = map.records.count(cls) != 0 ? map.records.at(cls) : cls;
-    for (const auto& [name, v] : live(out, int(Kind::Instance))->set) {
+    for (const auto& [name, v] : live(out, Kind::Instance)->set) {
         const std::string key = cls + "." + name;
         const auto m = memberOf(record, map.renamed.count(key) != 0 ? map.renamed.at(key) : name);
+        FUZZ_CHECK(m.has_value() || skip.count(name) != 0);
         if (skip.count(name) != 0) continue;
-        FUZZ_CHECK(m.has_value());
         const auto* p = static_cast<const uint8_t*>(rec) + m->offset;
         uint64_t raw = 0;
         memcpy(&raw, p, std::min<size_t>(m->width, 8));  // little-endian records, as this host is
         const unsigned shift = 64 - 8 * std::min<unsigned>(m->width, 8);
         const int64_t n = m->isSigned ? static_cast<int64_t>(raw << shift) >> shift : raw;
         const Object* a = v.ref;
-        const bool empty = map.nullable.count(key) != 0 && p[0] == 0;
         const size_t length =
                 map.whole.count(key) != 0 ? m->width : strnlen((const char*)p, m->width);
         if (v.type != 'L') {
             FUZZ_CHECK(m->width <= (v.type == 'I' ? 4u : 8u) &&
                        v.n == (v.type == 'I' ? jint(n) : n));
+        } else if (map.nullable.count(key) != 0 && p[0] == 0) {
+            FUZZ_CHECK(a == nullptr);
         } else if (a == nullptr || a->kind == Kind::String) {
-            FUZZ_CHECK(empty ? a == nullptr
-                             : a != nullptr && a->chars == expectedText(p, m->width).chars);
+            FUZZ_CHECK(a != nullptr && a->chars == expectedText(p, m->width).chars);
         } else if (a->kind == Kind::IntArray) {
-            FUZZ_CHECK(m->unit == 4 && a->ints.size() == m->width / 4);
-            for (size_t i = 0; i < a->ints.size(); ++i) {  // entries of y, cr, cb, t
-                FUZZ_CHECK(a->ints[i] ==
-                           dvbjni::yccToArgb(p[4 * i], p[4 * i + 1], p[4 * i + 2], p[4 * i + 3]));
+            FUZZ_CHECK(m->unit == 4 && a->data.size() == m->width);
+            for (size_t i = 0; i < a->data.size(); i += 4) {  // entries of y, cr, cb, t
+                jint argb;
+                FUZZ_CHECK((memcpy(&argb, &a->data[i], 4),
+                            argb == dvbjni::yccToArgb(p[i], p[i + 1], p[i + 2], p[i + 3])));
             }
         } else {
-            FUZZ_CHECK(a->bytes.size() == length &&
-                       (length == 0 || memcmp(a->bytes.data(), p, length) == 0));
+            FUZZ_CHECK(a->data.size() == length &&
+                       a->data.compare(0, length, (const char*)p, length) == 0);
             FUZZ_CHECK(length == 0 || a->from == static_cast<const uint8_t*>(at) + m->offset);
         }
     }
@@ -428,8 +429,10 @@ Reader reader(const B& buffer, const char* native, std::vector<jint> rooms, F en
     return {native, std::move(rooms), entry, sizeof(T), &buffer, sizeof buffer, check};
 }
 
+// A reader of one entry of a cache that the fake module keeps a shadow of.
 template <auto& cache>
 Reader cacheReader(const char* native) {
+    shadow(cache);
     return reader(cache, native, {std::size(cache)}, [](const jint* i) { return &cache[*i]; });
 }
 
@@ -456,9 +459,8 @@ struct Target {
         dvb->incStrong(&gJni);  // held for the process, as a bound Java object holds it
         gContext = dvbjni::contextBind(dvb.get());
         FUZZ_CHECK(gContext != 0);
-        for (const Native& n : gNatives) {
-            if (n.name != skip) natives.push_back(n);
-        }
+        std::copy_if(gNatives.begin(), gNatives.end(), std::back_inserter(natives),
+                     [&](const Native& n) { return n.name != skip; });
     }
 };
 
@@ -509,20 +511,20 @@ inline void callOne(FuzzedDataProvider& fdp, const Target& t, const char* name =
     std::vector<std::pair<jobject, std::string>> objects;  // with the simple name of the class
     for (size_t i = 1, k = 0; n->signature[i] != ')'; ++i, ++k) {
         const int mode = fdp.ConsumeIntegralInRange(0, 3);
-        const char c = n->signature[i];
-        const std::string cls =
-                c == 'L' ? n->signature.substr(i + 1, n->signature.find(';', i) - i - 1) : "";
-        if (c == 'I')
+        if (n->signature[i] == 'I') {
             ints.push_back(mode == 0 ? fdp.ConsumeIntegral<jint>()
                                      : fdp.ConsumeIntegralInRange(-1, mode == 1 ? 201 : 17));
-        if (c == 'L')
-            objects.push_back({mode == 0 && fdp.ConsumeBool() ? nullptr : newObject(cls.c_str()),
-                               cls.substr(cls.find_last_of("/$") + 1)});
-        args[k] = c == 'I'   ? ints.back()
-                  : c == 'L' ? reinterpret_cast<jlong>(objects.back().first)
-                  : c == 'Z' ? mode == 0
-                             : fdp.ConsumeIntegral<jlong>();
-        i += cls.size() + (c == 'L' ? 1 : 0);
+            args[k] = ints.back();
+        } else if (n->signature[i] == 'L') {
+            const size_t end = n->signature.find(';', i);
+            const std::string cls = n->signature.substr(i + 1, end - i - 1);
+            jobject o = mode == 0 && fdp.ConsumeBool() ? nullptr : newObject(cls.c_str());
+            objects.push_back({o, cls.substr(cls.find_last_of("/$") + 1)});
+            args[k] = reinterpret_cast<jlong>(o);
+            i = end;
+        } else {
+            args[k] = n->signature[i] == 'Z' ? mode == 0 : fdp.ConsumeIntegral<jlong>();
+        }
     }
     const std::vector<std::string> refusals = owed(objects, ints, r, t.indexFirst);
 
@@ -531,9 +533,12 @@ inline void callOne(FuzzedDataProvider& fdp, const Target& t, const char* name =
     const void* entry = r != nullptr && refusals.empty() ? r->entry(ints.data()) : nullptr;
     const auto* b = static_cast<const char*>(r != nullptr ? r->buffer : nullptr);
     const auto* e = static_cast<const char*>(entry);
-    if (r != nullptr) ASAN_POISON_MEMORY_REGION(b, entry != nullptr ? e - b : r->bufferSize);
-    if (entry != nullptr)
+    if (entry != nullptr) {
+        ASAN_POISON_MEMORY_REGION(b, e - b);
         ASAN_POISON_MEMORY_REGION(e + r->entrySize, b + r->bufferSize - e - r->entrySize);
+    } else if (r != nullptr) {
+        ASAN_POISON_MEMORY_REGION(b, r->bufferSize);
+    }
     const jlong result = call(*n, newObject(n->cls.c_str()), args);
     if (r != nullptr) ASAN_UNPOISON_MEMORY_REGION(b, r->bufferSize);
     for (const Shadow& s : shadows) FUZZ_CHECK(memcmp(s.cache, s.copy.get(), s.size) == 0);

@@ -37,8 +37,9 @@ Node* makeList(std::unique_ptr<Node[]>& block, Node (&cache)[N]) {
     }
     const size_t head = count == 0 ? 0 : in.ConsumeIntegralInRange<size_t>(0, count - 1);
     size_t copied = 0;
-    for (size_t i = head; i < count && copied < N; i = next[i])
+    for (size_t i = head; i < count && copied < N; i = next[i]) {
         fuzz::shadow(cache)[copied++] = block[i];
+    }
     fuzz::now.want = copied;
     return count == 0 ? nullptr : &block[head];
 }
@@ -73,11 +74,9 @@ private:
 const fuzz::Target& target() {
     static const fuzz::Target t(
             register_android_dvb_Scnm, [](android::DVB& dvb) { dvb.mScnm = new FuzzScnm; },
-            {{},
-             {},
-             {{"SCNM_ServiceInfo", 16}, {"SCNMNET_FrontEndSettings", 7}, {"SCNM_GetStatus", 3}},
-             {},
-             {}},
+            fuzz::Mapping{{{"SCNM_ServiceInfo", 16},
+                           {"SCNMNET_FrontEndSettings", 7},
+                           {"SCNM_GetStatus", 3}}},
             {fuzz::cacheReader<s_SvcExt>("Scnm_GetServiceList"),
              fuzz::cacheReader<s_SvcNet>("Scnm_GetNetworkList")},
             true, "Dvb_SystemInit");
@@ -89,7 +88,7 @@ const fuzz::Target& target() {
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     const fuzz::Target& t = target();
     FuzzedDataProvider fdp(data, size);
-    fuzz::shadow(s_SvcExt), fuzz::shadow(s_SvcNet), fuzz::zeroCaches();
+    fuzz::zeroCaches();
     for (int calls = fdp.ConsumeIntegralInRange(1, 6); calls > 0; --calls) fuzz::callOne(fdp, t);
     return 0;
 }

@@ -49,7 +49,7 @@ DVB_RECORD_FIELD(Sample, bytes, 52);
 DVB_RECORD_FIELD(Sample, all, 116);
 DVB_RECORD_FIELD(Sample, one, 148);
 DVB_RECORD_FIELD(Sample, wide, 149);
-const fuzz::Mapping kMapping{{}, {}, {{"Sample", 13}}, {"Sample.textOrNull"}, {"Sample.all"}};
+const fuzz::Mapping kMapping{{{"Sample", 13}}, {}, {}, {"Sample.textOrNull"}, {"Sample.all"}};
 
 }  // namespace
 

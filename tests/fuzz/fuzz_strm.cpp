@@ -80,16 +80,16 @@ public:
 // Four classes share the settings record; an event item's text reaches Java as `type`.
 fuzz::Mapping mapping() {
     fuzz::Mapping m;
-    for (const char* cls : {"STRM_Service", "STRM_PvrSetting", "STRM_LangCode", "STRM_FrontEnd"}) {
-        m.records[cls] = "STRM_Settings";
-    }
-    m.renamed["ExtEpgEventItem.type"] = "itemText";
-    m.nullable = {"ExtEpgEventItem.itemDesc", "ExtEpgEventItem.type"};
     m.counts = {{"STRM_Service", 11},   {"STRM_PvrSetting", 3}, {"STRM_LangCode", 2},
                 {"STRM_FrontEnd", 23},  {"STRM_GetStatus", 23}, {"STRM_StreamInfo", 8},
                 {"VideoContent", 2},    {"AudioContent", 7},    {"SubtitleContent", 7},
                 {"TeletextContent", 7}, {"EpgEvent", 11},       {"ExtEpgEvent", 2},
                 {"ExtEpgEventItem", 2}};
+    for (const char* cls : {"STRM_Service", "STRM_PvrSetting", "STRM_LangCode", "STRM_FrontEnd"}) {
+        m.records[cls] = "STRM_Settings";
+    }
+    m.renamed["ExtEpgEventItem.type"] = "itemText";
+    m.nullable = {"ExtEpgEventItem.itemDesc", "ExtEpgEventItem.type"};
     return m;
 }
 
@@ -114,9 +114,7 @@ const fuzz::Target& target() {
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     const fuzz::Target& t = target();
     FuzzedDataProvider fdp(data, size);
-    fuzz::shadow(videoContents), fuzz::shadow(audioContents), fuzz::shadow(subtitleContents);
-    fuzz::shadow(teletextContents), fuzz::shadow(caSysId), fuzz::shadow(EpgExtentItemNow);
-    fuzz::shadow(EpgExtentItemNext), fuzz::zeroCaches();
+    fuzz::shadow(caSysId), fuzz::zeroCaches();
     fuzz::callOne(fdp, t, "Strm_CreatStreamInfo");
     for (int calls = fdp.ConsumeIntegralInRange(1, 12); calls > 0; --calls) fuzz::callOne(fdp, t);
     return 0;

@@ -29,30 +29,24 @@ public:
                     }
                 }
             }
-            auto bytes = in.ConsumeBytes<uint8_t>(in.ConsumeIntegralInRange<size_t>(1, 64));
+            auto bytes = in.ConsumeBytes<char>(in.ConsumeIntegralInRange<size_t>(1, 64));
             bytes.resize(std::min(bytes.size(), sizeof Data - at));
-            if (!bytes.empty())
-                memcpy(reinterpret_cast<uint8_t*>(&Data) + at, bytes.data(), bytes.size());
+            std::copy(bytes.begin(), bytes.end(), reinterpret_cast<char*>(&Data) + at);
         }
         fuzz::now.written.push_back({"SUBTTL_Data", &Data, {&Data, [](const void*) {}}});
         return fuzz::op();
     }
 };
 
-// The size rule: n = width x height as a 32-bit product. A negative n zeroes the size Java sees
-// and delivers nothing more. Otherwise Java gets n pixels, but never more than the buffer
-// holds: a size above it (as n or as the real product) delivers the rows that fit, none for a
-// width of 0 or less, and Java is told that height.
-const fuzz::Mapping kMapping = {{{"SUBTTL_Data_t", "SUBTTL_Data"}},
-                                {},
-                                {{"SUBTTL_Data_t", 4},
-                                 {"SUBTTL_Page_t", 5},
-                                 {"SUBTTL_RegionDef", 3},
-                                 {"SUBTTL_ObjectDef", 8},
-                                 {"SUBTTL_Display", 9},
-                                 {"SUBTTL_Clut", 5}},
-                                {},
-                                {"SUBTTL_ObjectDef.psz_text"}};
+fuzz::Mapping mapping() {
+    fuzz::Mapping m;
+    m.counts = {{"SUBTTL_Data_t", 4},    {"SUBTTL_Page_t", 5},  {"SUBTTL_RegionDef", 3},
+                {"SUBTTL_ObjectDef", 8}, {"SUBTTL_Display", 9}, {"SUBTTL_Clut", 5}};
+    m.records["SUBTTL_Data_t"] = "SUBTTL_Data";
+    m.whole = {"SUBTTL_ObjectDef.psz_text"};
+    return m;
+}
+const fuzz::Mapping kMapping = mapping();
 
 // The size rule: n = width x height as a 32-bit product. A negative n zeroes the size Java sees
 // and delivers nothing more. Otherwise Java gets n pixels, but never more than the buffer
@@ -73,9 +67,9 @@ void expectRegion(jobject out, const void* entry) {
                set["i_height"].n == told);
     const fuzz::Object* a = n < 0 ? nullptr : set["p_pixbuf"].ref;
     FUZZ_CHECK(n < 0 ||
-               (a != nullptr && a->kind == fuzz::Kind::ByteArray && a->bytes.size() == pixels));
+               (a != nullptr && a->kind == fuzz::Kind::ByteArray && a->data.size() == pixels));
     FUZZ_CHECK(pixels == 0 ||
-               (a->from == r.p_pixbuf && memcmp(a->bytes.data(), r.p_pixbuf, pixels) == 0));
+               (a->from == r.p_pixbuf && memcmp(a->data.data(), r.p_pixbuf, pixels) == 0));
 }
 
 const fuzz::Target& target() {

@@ -25,7 +25,6 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     FUZZ_CHECK(dvbjni::isModifiedUtf8(field.get(), want.length) == want.wellFormed);
 
     jstring s = dvbjni::newStringFromField(fuzz::jni(), field.get(), width);
-    FUZZ_CHECK(fuzz::now.thrown.empty() &&
-               fuzz::live(s, int(fuzz::Kind::String))->chars == want.chars);
+    FUZZ_CHECK(fuzz::now.thrown.empty() && fuzz::live(s, fuzz::Kind::String)->chars == want.chars);
     return 0;
 }
