@@ -15,20 +15,24 @@ public:
     int32_t Init() override { return fuzz::op(); }
     int32_t Start(const SUBTTL_Settings*) override { return fuzz::op(); }
     int32_t Stop(int32_t) override { return fuzz::op(); }
-    // Up to 12 patches, mostly outside the pixels, where a patch would be lost in the buffer.
+    // Up to 12 patches, anywhere or where the readers look: the counts and the page, a region's
+    // nine ints (its size among them) or what follows its pixels, everything after the regions.
     int32_t GetData(int32_t, void* data) override {
         FUZZ_CHECK(data == &Data);
         FuzzedDataProvider& in = *fuzz::now.input;
         for (int n = in.ConsumeIntegralInRange(0, 12); n > 0; --n) {
-            size_t at = in.ConsumeIntegralInRange<size_t>(0, sizeof Data - 1);
-            if (in.ConsumeIntegralInRange(0, 3) != 0) {
-                at %= sizeof Data - sizeof Data.regions[0].p_pixbuf * kSubttlRegions;
-                for (const SUBTTL_Region_t& r : Data.regions) {
-                    if (at >= static_cast<size_t>(r.p_pixbuf - reinterpret_cast<uint8_t*>(&Data))) {
-                        at += sizeof r.p_pixbuf;
-                    }
-                }
-            }
+            using R = SUBTTL_Region_t;
+            const size_t regions = offsetof(SUBTTL_Data, regions),
+                         tail = offsetof(R, i_object_defs);
+            const size_t r = regions + in.ConsumeIntegralInRange(0, 4) * sizeof(R);
+            const size_t cluts = offsetof(SUBTTL_Data, numCluts);
+            const std::pair<size_t, size_t> areas[] = {{0, sizeof Data},
+                                                       {0, regions},
+                                                       {r, offsetof(R, p_pixbuf)},
+                                                       {r + tail, sizeof(R) - tail},
+                                                       {cluts, sizeof Data - cluts}};
+            const auto [start, size] = areas[in.ConsumeIntegralInRange(0, 4)];
+            const size_t at = start + in.ConsumeIntegral<uint32_t>() % size;
             auto bytes = in.ConsumeBytes<char>(in.ConsumeIntegralInRange<size_t>(1, 64));
             bytes.resize(std::min(bytes.size(), sizeof Data - at));
             std::copy(bytes.begin(), bytes.end(), reinterpret_cast<char*>(&Data) + at);
