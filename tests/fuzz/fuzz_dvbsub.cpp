@@ -6,7 +6,7 @@
 #include <cstdint>
 #include <vector>
 
-#include "FakeJni.h"
+#include "Harness.h"
 #include "broadcast/DvbSubtitle.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
