@@ -12,7 +12,7 @@ import java.util.*;
  * Where the fields of one Java record class live in a native record, written from the interface
  * description (never from the library's own maps), with the conversions every contract test
  * runs: Java values into record bytes, record bytes into Java values, patterned values for both.
- * A spec lists "javaName:kind@offset". Kinds: i32 u8 u16 s16 (int fields); u32j i64 (long
+ * A layout line lists "javaName:kind@offset". Kinds: i32 u8 u16 s16 (int fields); u32j i64 (long
  * fields); strN (text of N bytes, cut at N on the way in); nstrN (an empty field is null); lang
  * (three bytes in, four out); eng (lang, null meaning "eng"); pathN (text that must fit with its
  * zero byte); bytesN (zero-ended text as exactly its bytes); allN (every byte); yccN (N colour
@@ -37,10 +37,10 @@ final class Layout {
     final int size;
     final List<Slot> slots = new ArrayList<>();
 
-    Layout(Class<?> cls, int size, String spec) {
+    Layout(Class<?> cls, int size, String line) {
         this.cls = cls;
         this.size = size;
-        for (String item : spec.trim().split("\\s+")) {
+        for (String item : line.trim().split("\\s+")) {
             String[] p = item.split("[:@]");
             int at = Integer.parseInt(p[2]);
             if (p[1].equals("fe")) {
