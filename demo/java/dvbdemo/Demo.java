@@ -70,13 +70,13 @@ public final class Demo {
         System.out.println("== " + text);
     }
 
-    /** Waits up to 10 s for event `msg`, and gives its two values. */
-    int[] await(int msg) throws InterruptedException {
-        long end = System.nanoTime() + TimeUnit.SECONDS.toNanos(10);
+    /** Waits up to `seconds` for event `msg`, and gives it (null when none came). */
+    int[] await(int msg, int seconds) throws InterruptedException {
+        long end = System.nanoTime() + TimeUnit.SECONDS.toNanos(seconds);
         for (int[] e; (e = events.poll(end - System.nanoTime(), TimeUnit.NANOSECONDS)) != null; ) {
             if (e[0] == msg) return e;
         }
-        throw new IllegalStateException("no event " + msg);
+        return null;
     }
 
     void run() throws Exception {
@@ -315,6 +315,10 @@ public final class Demo {
         }
     }
 
+    /**
+     * Collects the service's events into the event database, waits for the store, then walks
+     * its schedule with EPG_GetEvent (each call gives the next event) and prints tomorrow's.
+     */
     void schedule(Strm strm, long handle, Channel c) throws InterruptedException {
         title("Tomorrow on " + c.name + ", from the event database");
         Strm.EpgSvc svc = new Strm.EpgSvc();
@@ -323,10 +327,17 @@ public final class Demo {
         svc.onId = c.info.onId;
         strm.EpgMd_ClearService();
         strm.EpgMd_AddService(svc);
+        // A database kept from an earlier run already holds the week: nothing new is stored.
+        int[] stored = await(260, 3);
+        System.out.println(stored != null ? stored[2] + " events of the week stored" : "the week was stored before");
+        long tomorrow = (strm.Strm_GetTime(handle, 0) / 86400 + 1) * 86400;
         Strm.EpgEvent e = new Strm.EpgEvent();
         Strm.ExtEpgEvent x = new Strm.ExtEpgEvent();
-        strm.EPG_GetEvent(handle, svc, e, x);
-        printEvent("database", e);
+        for (int i = 0; i < 200 && strm.EPG_GetEvent(handle, svc, e, x) == 0; i++) {
+            long start = e.startTime & 0xFFFFFFFFL;
+            if (start >= tomorrow + 86400) break;
+            if (start >= tomorrow) printEvent("", e);
+        }
     }
 
     /** Waits for a display set with regions and writes it, composed on the display, as a PNG. */
