@@ -52,7 +52,7 @@ class ReceiverEndToEndTest {
     @Test
     @Order(1)
     void startUpCreatesTheEventDatabase() throws InterruptedException {
-        EPG_DB.delete();
+        for (String end : new String[] {"", "-wal", "-shm"}) new File(EPG_DB + end).delete();
         assertEquals(0, dvb.getScnm().Dvb_SystemInit(new Scnm.DVB_Config()));
         assertTrue(EPG_DB.exists());
         assertEquals(List.of(230, 0, 0), next(230));
@@ -142,6 +142,21 @@ class ReceiverEndToEndTest {
         assertEquals((long) now.startTime + now.duration, following.startTime, "next follows");
         assertEquals(List.of(220, (int) stream, now.evtId), next(220));
         assertTrue(nowExt.itemCount > 0 && now.name.length > 0);
+
+        // The event database: the service's week stored, then walked from now on.
+        Strm.EpgSvc epg = new Strm.EpgSvc();
+        epg.svcId = kanalEins.svcId;
+        epg.tsId = kanalEins.tsId;
+        epg.onId = kanalEins.onId;
+        assertEquals(0, strm.EpgMd_ClearService());
+        assertEquals(0, strm.EpgMd_AddService(epg));
+        assertEquals(kanalEins.svcId, (int) next(260).get(1));
+        Strm.EpgEvent db = new Strm.EpgEvent();
+        for (Strm.EpgEvent want : List.of(now, following)) {
+            assertEquals(0, strm.EPG_GetEvent(stream, epg, db, new Strm.ExtEpgEvent()));
+            assertEquals(List.of(want.evtId, want.startTime, want.duration), List.of(db.evtId, db.startTime, db.duration));
+            assertArrayEquals(want.name, db.name);
+        }
     }
 
     @Test
