@@ -2,7 +2,11 @@ package android.DVB;
 
 import static org.junit.jupiter.api.Assertions.*;
 
+import java.io.BufferedReader;
 import java.io.File;
+import java.io.IOException;
+import java.io.InputStreamReader;
+import java.lang.management.ManagementFactory;
 import java.nio.ByteBuffer;
 import java.nio.ByteOrder;
 import java.nio.charset.StandardCharsets;
@@ -23,6 +27,7 @@ class ReceiverEndToEndTest {
     static final File EPG_DB = new File(System.getProperty("dvb.epgdb"));
     static long stream;
     static Scnm.SCNM_ServiceInfo kanalEins;
+    static final List<String> scanned = new ArrayList<>(); // "onid:tsid:sid" of each service found
 
     static {
         dvb.setOnEventListener((d, msg, e1, e2, obj) -> events.add(List.of(msg, e1, e2)));
@@ -88,6 +93,7 @@ class ReceiverEndToEndTest {
             scnm.Scnm_GetServiceList(i, info);
             found.put(info.lcn, new String(info.svcName, StandardCharsets.ISO_8859_1));
             if (info.lcn == 1) kanalEins = info;
+            scanned.add(info.onId + ":" + info.tsId + ":" + info.svcId);
         }
         // Table 00 names: "Straßenfeger" holds ISO 6937's 0xFB for the sharp s.
         assertEquals(Map.of(1L, "Kanal Eins", 3L, "Regional Berlin-Brandenburg", 4L, "Nachrichten 24",
@@ -206,5 +212,53 @@ class ReceiverEndToEndTest {
         assertEquals(List.of(0x100, 1, " P100   "), List.of((int) b.getShort(0), (int) image[7], header.toString()));
         assertEquals(0, ttx.Teltxt_Stop(page));
         assertEquals(0, dvb.getStrm().Strm_Close(stream));
+    }
+
+    @Test
+    @Order(5)
+    void aStoreKilledMidwayLeavesADatabaseThatOpensWithWhatItCommitted() throws Exception {
+        File db = new File(EPG_DB.getParent(), "killed-epg.db");
+        for (String end : new String[] {"", "-wal", "-shm"}) new File(db + end).delete();
+        Process fill = child(db, "fill", scanned);
+        BufferedReader out = new BufferedReader(new InputStreamReader(fill.getInputStream(), StandardCharsets.UTF_8));
+        assertEquals("open 0", out.readLine());
+        String stored = out.readLine();
+        fill.destroyForcibly().waitFor();
+        assertTrue(stored.startsWith("stored "), stored);
+        String sid = stored.substring(7);
+        // SQLite's own tool reads the file that the killed process left.
+        Process sqlite = new ProcessBuilder("sqlite3", db.getPath(), "PRAGMA integrity_check",
+                "SELECT count(*) > 100 FROM event WHERE sid = " + sid).start();
+        assertEquals(List.of("ok", "1"), lines(sqlite));
+        String service = scanned.stream().filter(s -> s.endsWith(":" + sid)).findFirst().get();
+        List<String> reopened = lines(child(db, "open", List.of(service)));
+        assertEquals("open 0", reopened.get(0));
+        assertTrue(reopened.get(1).matches("event 0 [1-9][0-9]* [1-9][0-9]*"), reopened.toString());
+    }
+
+    /** A JVM with this one's options on event database `db`, running ReceiverChild. */
+    static Process child(File db, String mode, List<String> services) throws IOException {
+        List<String> cmd = new ArrayList<>();
+        cmd.add(System.getProperty("java.home") + "/bin/java");
+        cmd.addAll(ManagementFactory.getRuntimeMXBean().getInputArguments());
+        cmd.addAll(List.of("-cp", jarOf(DVB.class) + File.pathSeparator + jarOf(ReceiverChild.class),
+                ReceiverChild.class.getName(), mode));
+        cmd.addAll(services);
+        ProcessBuilder pb = new ProcessBuilder(cmd).redirectError(ProcessBuilder.Redirect.INHERIT);
+        pb.environment().put("DVB_EPG_DB", db.getPath());
+        return pb.start();
+    }
+
+    static String jarOf(Class<?> c) {
+        return new File(c.getProtectionDomain().getCodeSource().getLocation().getPath()).getPath();
+    }
+
+    static List<String> lines(Process p) throws Exception {
+        List<String> all = new ArrayList<>();
+        try (BufferedReader r = new BufferedReader(new InputStreamReader(p.getInputStream(), StandardCharsets.UTF_8))) {
+            for (String line; (line = r.readLine()) != null; ) all.add(line);
+        }
+        assertEquals(0, p.waitFor());
+        return all;
     }
 }
