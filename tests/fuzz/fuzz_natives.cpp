@@ -80,9 +80,9 @@ std::vector<std::vector<std::pair<std::string, int>>> gOps;
 jlong argument(FuzzedDataProvider& in, const std::string& sig, size_t& i) {
     const int mode = in.ConsumeIntegralInRange(0, 3);
     if (sig[i] == 'I' || sig[i] == 'J') {
-        // Near a cache's or a buffer's room, or any value.
-        const int room = mode == 2 ? 201 : 17;
-        if (mode != 3) return room - in.ConsumeIntegralInRange(0, room + 1);
+        // From -1 to about a cache's or a buffer's room (0 once the input is used up), or any.
+        const int room = mode == 2 ? 201 : 17, n = in.ConsumeIntegralInRange(0, room + 1);
+        if (mode != 3) return n > room ? -1 : n;
         return sig[i] == 'I' ? in.ConsumeIntegral<jint>() : in.ConsumeIntegral<jlong>();
     }
     if (sig[i] == 'Z') return mode;
@@ -182,12 +182,18 @@ bool setUp() {
 
 }  // namespace
 
-// Up to eight calls: the caches that one fills, the next may read.
+// Up to eight calls of the natives of one class: what one fills, the next may read.
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     static const bool ready = setUp();
     FuzzedDataProvider in(data, size);
+    const auto& natives = fuzz::gNatives;
+    const std::string cls = natives[in.ConsumeIntegralInRange<size_t>(0, natives.size() - 1)].cls;
+    std::vector<size_t> own;
+    for (size_t i = 0; i < natives.size(); ++i) {
+        if (natives[i].cls == cls) own.push_back(i);
+    }
     for (int calls = in.ConsumeIntegralInRange(1, 8); ready && calls > 0; --calls) {
-        callOne(in, in.ConsumeIntegralInRange<size_t>(0, fuzz::gNatives.size() - 1));
+        callOne(in, own[in.ConsumeIntegralInRange<size_t>(0, own.size() - 1)]);
     }
     return 0;
 }
