@@ -232,22 +232,22 @@ jobjectArray toStringArray(JNIEnv* env, const std::vector<std::string>& lines) {
     return a;
 }
 
-jobjectArray Spy_takeLogs(JNIEnv* env, jclass) {
+// Hands the lines of `from` to Java and forgets them.
+jobjectArray take(JNIEnv* env, std::vector<std::string>& from) {
     std::vector<std::string> lines;
     {
         std::lock_guard<std::mutex> lock(gLock);
-        lines.swap(gLogs);
+        lines.swap(from);
     }
     return toStringArray(env, lines);
 }
 
+jobjectArray Spy_takeLogs(JNIEnv* env, jclass) {
+    return take(env, gLogs);
+}
+
 jobjectArray Spy_takeGlobalRefEvents(JNIEnv* env, jclass) {
-    std::vector<std::string> events;
-    {
-        std::lock_guard<std::mutex> lock(gLock);
-        events.swap(gRefEvents);
-    }
-    return toStringArray(env, events);
+    return take(env, gRefEvents);
 }
 
 void Spy_trackGlobalRefs(JNIEnv* env, jclass) {
@@ -263,17 +263,22 @@ void Spy_trackGlobalRefs(JNIEnv* env, jclass) {
     hookThread(env);
 }
 
+// What the loaded libDVBjni exports as `name`, or null. The library stays loaded for the
+// process, as the VM never unloads it.
+void* exported(const char* name) {
+    void* lib = dlopen("libDVBjni.so", RTLD_NOW | RTLD_NOLOAD);
+    void* sym = lib != nullptr ? dlsym(lib, name) : nullptr;
+    if (lib != nullptr) dlclose(lib);
+    return sym;
+}
+
 // Runs libDVBjni's JNI_OnLoad once more in this VM (registration is idempotent) and returns
 // its result, which Java cannot see from System.loadLibrary.
 jint Spy_callOnLoad(JNIEnv* env, jclass) {
-    void* lib = dlopen("libDVBjni.so", RTLD_NOW | RTLD_NOLOAD);
-    if (lib == nullptr) return 0;
-    auto onLoad = reinterpret_cast<jint (*)(JavaVM*, void*)>(dlsym(lib, "JNI_OnLoad"));
+    auto onLoad = reinterpret_cast<jint (*)(JavaVM*, void*)>(exported("JNI_OnLoad"));
     JavaVM* vm = nullptr;
     env->GetJavaVM(&vm);
-    jint result = onLoad != nullptr ? onLoad(vm, nullptr) : 0;
-    dlclose(lib);
-    return result;
+    return onLoad != nullptr ? onLoad(vm, nullptr) : 0;
 }
 
 // Entry `index` of the cache that libDVBjni exports as `symbol`, `size` bytes per entry; null
@@ -281,15 +286,12 @@ jint Spy_callOnLoad(JNIEnv* env, jclass) {
 jbyteArray Spy_cacheEntry(JNIEnv* env, jclass, jstring symbol, jint index, jint size) {
     ScopedUtfChars name(env, symbol);
     if (name.c_str() == nullptr || index < 0 || size <= 0) return nullptr;
-    void* lib = dlopen("libDVBjni.so", RTLD_NOW | RTLD_NOLOAD);
-    if (lib == nullptr) return nullptr;
-    const auto* base = static_cast<const uint8_t*>(dlsym(lib, name.c_str()));
+    const auto* base = static_cast<const uint8_t*>(exported(name.c_str()));
     Dl_info info;
     ElfW(Sym)* sym = nullptr;
     bool found = base != nullptr &&
                  dladdr1(base, &info, reinterpret_cast<void**>(&sym), RTLD_DL_SYMENT) != 0 &&
                  sym != nullptr;
-    dlclose(lib);
     if (!found || (int64_t{index} + 1) * size > static_cast<int64_t>(sym->st_size)) return nullptr;
     return toBytes(env, base + int64_t{index} * size, size);
 }
@@ -297,15 +299,12 @@ jbyteArray Spy_cacheEntry(JNIEnv* env, jclass, jstring symbol, jint index, jint 
 // The exported module callbacks Strmcallback and Subttlcallback, called with some arguments: what
 // each answers.
 jintArray Spy_callbacks(JNIEnv* env, jclass) {
-    void* lib = dlopen("libDVBjni.so", RTLD_NOW | RTLD_NOLOAD);
-    if (lib == nullptr) return nullptr;
     jint got[2];
     const char* names[] = {"_Z12StrmcallbackPvii", "_Z14SubttlcallbackPvii"};
     for (int i = 0; i < 2; ++i) {
-        auto fn = reinterpret_cast<int (*)(void*, int, int)>(dlsym(lib, names[i]));
-        got[i] = fn != nullptr ? fn(lib, -1, 7) : -99;  // -99: not exported
+        auto fn = reinterpret_cast<int (*)(void*, int, int)>(exported(names[i]));
+        got[i] = fn != nullptr ? fn(&got, -1, 7) : -99;  // -99: not exported
     }
-    dlclose(lib);
     jintArray a = env->NewIntArray(2);
     if (a != nullptr) env->SetIntArrayRegion(a, 0, 2, got);
     return a;

@@ -39,36 +39,6 @@ class BehaviourTest extends SpyTestBase {
         assertArrayEquals(want, Spy.record(call, 0));
     }
 
-    @Test
-    void caStatusTakesSourceFromTheFirstAddress() {
-        Spy.setOut("Cfg::CaGetStatus", 1, 0, le32(3));
-        Spy.setOut("Cfg::CaGetStatus", 2, 0, le32(-7));
-        Spy.setResult("Cfg::CaGetStatus", -1);
-        Cfg.CA_Status s = new Cfg.CA_Status();
-        assertEquals(0, dvb.getCfg().Cfg_CaGetStatus(-4, s));
-        assertEquals(Arrays.asList(3, -7), Arrays.asList(s.source, s.lastCwSet));
-        int call = onlyCall("Cfg::CaGetStatus");
-        assertArrayEquals(new long[] {-4, 0, 0}, Spy.args(call));
-        assertArrayEquals(le32(0), Spy.record(call, 0), "zeroed first");
-        assertArrayEquals(le32(0), Spy.record(call, 1), "zeroed first");
-    }
-
-    @Test
-    void navigationValuesAreAllWrittenWhateverTheModuleSays() {
-        Spy.setOut("Teltxt::SetData", 3, 0, le32(100));
-        Spy.setOut("Teltxt::SetData", 5, 0, le32(0x7FFFFFFF));
-        Spy.setOut("Teltxt::SetData", 6, 0, le32(-190));
-        Spy.setResult("Teltxt::SetData", -9);
-        Teltxt.TELTXT_NavPages nav = new Teltxt.TELTXT_NavPages();
-        nav.prev10 = 77;
-        assertEquals(-9, dvb.getTeltxt().Teltxt_SetData(HANDLE, -3, 0x10000, nav));
-        assertEquals(Arrays.asList(100, 0, 0x7FFFFFFF, -190),
-                Arrays.asList(nav.prev100, nav.prev10, nav.next10, nav.next100));
-        int call = onlyCall("Teltxt::SetData");
-        assertArrayEquals(new long[] {LOW, -3, 0x10000, 0, 0, 0, 0}, Spy.args(call));
-        for (int r = 0; r < 4; r++) assertArrayEquals(le32(0), Spy.record(call, r), "value " + r);
-    }
-
     /** The byte the spy's decoder holds at `position` of its data. */
     static byte teletextByte(long position) {
         return (byte) ((position * 31 + 7) ^ (position >> 8));
@@ -106,16 +76,6 @@ class BehaviourTest extends SpyTestBase {
         assertEquals("count -5 is negative", e.getMessage());
         assertArrayEquals(bytes(1, 2, 3), data);
         assertEquals(0, Spy.callCount());
-    }
-
-    @Test
-    void streamTimeIsZeroExtended() {
-        Spy.setOut("Strm::GetTime", 1, 0, le32(-1));
-        Spy.setResult("Strm::GetTime", -1);
-        assertEquals(4294967295L, dvb.getStrm().Strm_GetTime(HANDLE, -1));
-        int call = onlyCall("Strm::GetTime");
-        assertArrayEquals(new long[] {LOW, 0}, Spy.args(call));
-        assertArrayEquals(le32(0), Spy.record(call, 0));
     }
 
     @ParameterizedTest

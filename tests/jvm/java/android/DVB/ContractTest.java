@@ -16,10 +16,14 @@ import org.junit.jupiter.params.provider.*;
  * every text length (empty, short, the field's width, longer) passes through.
  */
 class ContractTest extends SpyTestBase {
-    enum Ret { MODULE, ZERO }
+    /** What the call returns: the module's result, 0, or the u32 written through the last pointer. */
+    enum Ret { MODULE, ZERO, WRITTEN }
 
-    /** A Java argument made from a layout: filled and sent (in), or scripted and read (out). */
-    record Rec(Layout layout, boolean in, int arg, int record) {}
+    /**
+     * A Java argument made from a layout: filled and sent (in), or scripted and read (out),
+     * the module writing it through one pointer per `part` bytes from `arg` on.
+     */
+    record Rec(Layout layout, boolean in, int arg, int record, int part) {}
 
     record Row(String cls, String method, String op, Ret ret, Object[] args, long... opArgs) {
         @Override
@@ -29,11 +33,15 @@ class ContractTest extends SpyTestBase {
     }
 
     static Rec in(Layout l, int record) {
-        return new Rec(l, true, -1, record);
+        return new Rec(l, true, -1, record, l.size);
     }
 
     static Rec out(Layout l, int arg, int record) {
-        return new Rec(l, false, arg, record);
+        return new Rec(l, false, arg, record, l.size);
+    }
+
+    static Rec split(Layout l, int arg, int record) {
+        return new Rec(l, false, arg, record, 4);
     }
 
     static Row row(String method, String op, Ret ret, Object[] args, long... opArgs) {
@@ -70,6 +78,7 @@ class ContractTest extends SpyTestBase {
         row("Cfg_SetVideoPos", "Cfg::SetVideoPos", Ret.MODULE, a(2, in(VIDEO_POSITION, 0)), 2, 0),
         row("Cfg_GetVideoPos", "Cfg::GetVideoPos", Ret.ZERO, a(6, out(VIDEO_POSITION, 1, 0)),
                 6, 0),
+        row("Cfg_CaGetStatus", "Cfg::CaGetStatus", Ret.ZERO, a(-4, split(CA_STATUS, 1, 0)), -4, 0, 0),
         row("Cfg_CaStandby", "Cfg::CaStandby", Ret.ZERO, a(-1), -1),
         row("Cfg_GpioSet", "Cfg::GpioSet", Ret.ZERO, a(12, -13), 12, -13),
         row("Cfg_SetWakeup", "Cfg::SetWakeup", Ret.ZERO, a(3600), 3600),
@@ -103,6 +112,7 @@ class ContractTest extends SpyTestBase {
                 a(H, out(STREAM_INFO, 1, 0)), L, 0),
         row("Strm_GetAllEvent", "Strm::GetAllEvent", Ret.ZERO, a(H, out(EVENT, 1, 0),
                 out(EVENT, 2, 1), out(EXT_EVENT, 3, 2), out(EXT_EVENT, 4, 3)), L, 0, 0, 0, 0),
+        row("Strm_GetTime", "Strm::GetTime", Ret.WRITTEN, a(H, -1L), L, 0),
         row("Strm_GetEvent", "Strm::GetEvent", Ret.ZERO, a(H, out(EVENT, 1, 0)), L, 0),
         row("EPG_GetEvent", "Strm::EPG_GetEvent", Ret.ZERO,
                 a(H, in(EPG_SVC_IDS, 0), out(EVENT, 2, 1), out(EXT_EVENT, 3, 2)), 0, L, 0, 0),
@@ -115,6 +125,8 @@ class ContractTest extends SpyTestBase {
         row("Subttl_Stop", "Subttl::Stop", Ret.ZERO, a(H), L),
         row("Teltxt_Start", "Teltxt::Start", Ret.MODULE, a(in(TELTXT_SETTINGS, 0)), 0),
         row("Teltxt_Stop", "Teltxt::Stop", Ret.ZERO, a(H), L),
+        row("Teltxt_SetData", "Teltxt::SetData", Ret.MODULE, a(H, -3, 0x10000, split(NAV_PAGES, 3, 0)),
+                L, -3, 0x10000, 0, 0, 0, 0),
     };
 
     static Stream<Arguments> cases() {
@@ -158,9 +170,16 @@ class ContractTest extends SpyTestBase {
                 if (sent[rec.record] == null) sent[rec.record] = new byte[rec.layout.size];
                 rec.layout.toRecord(javaArgs[i], sent[rec.record]);
             } else if (scripted[rec.record] == null) {
-                scripted[rec.record] = scriptFor(r, rec, seed);
-                Spy.setOut(r.op, rec.arg, 0, scripted[rec.record]);
+                byte[] whole = scriptFor(r, rec, seed);
+                for (int k = 0; k * rec.part < whole.length; k++) {
+                    scripted[rec.record + k] = Arrays.copyOfRange(whole, k * rec.part, (k + 1) * rec.part);
+                    Spy.setOut(r.op, rec.arg + k, 0, scripted[rec.record + k]);
+                }
             }
+        }
+        if (r.ret == Ret.WRITTEN) {
+            scripted[0] = le32(result);
+            Spy.setOut(r.op, r.opArgs.length - 1, 0, scripted[0]);
         }
         Object got = call(module(dvb, r.cls), r.method, javaArgs);
 
@@ -173,10 +192,15 @@ class ContractTest extends SpyTestBase {
         }
         for (int i = 0; i < r.args.length; i++) {
             if (r.args[i] instanceof Rec rec && !rec.in) {
-                rec.layout.assertJava(scripted[rec.record], javaArgs[i], kept[i]);
+                byte[] whole = new byte[rec.layout.size];
+                for (int k = 0; k * rec.part < whole.length; k++) {
+                    System.arraycopy(scripted[rec.record + k], 0, whole, k * rec.part, rec.part);
+                }
+                rec.layout.assertJava(whole, javaArgs[i], kept[i]);
             }
         }
-        assertEquals(r.ret == Ret.ZERO ? 0 : result, ((Number) got).longValue(), "result");
+        long want = r.ret == Ret.ZERO ? 0 : r.ret == Ret.WRITTEN ? result & 0xFFFFFFFFL : result;
+        assertEquals(want, ((Number) got).longValue(), "result");
         List<String> lines = new ArrayList<>();
         if (r.cls.equals("Scnm")) lines.add(GETTER);
         if (r.method.equals("Cfg_Reset")) lines.add("2 CFG android_dvb_Cfg_Reset was called");

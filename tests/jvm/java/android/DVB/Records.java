@@ -8,6 +8,8 @@ final class Records {
     static final Layout ANT_FRONTEND = new Layout(Cfg.ANT_FrontendParameters.class, 76, "x:fe@0");
     static final Layout ANT_STATUS = new Layout(Cfg.ANT_Status.class, 16,
             "feStatus:i32@0 strength:i32@4 quality:i32@12");
+    /** Written through two pointers, the source through the first. */
+    static final Layout CA_STATUS = new Layout(Cfg.CA_Status.class, 8, "source:i32@0 lastCwSet:i32@4");
     static final Layout VIDEO_POSITION = new Layout(Cfg.Video_Position.class, 16,
             "x:i32@0 y:i32@4 w:i32@8 h:i32@12");
 
@@ -106,6 +108,9 @@ final class Records {
             "i_id:u8@0 i_version:u8@1 c_2b:ycc4@2 c_4b:ycc16@18 c_8b:ycc256@82");
 
     // Teletext module
+    /** Written through four pointers, in this order. */
+    static final Layout NAV_PAGES = new Layout(Teltxt.TELTXT_NavPages.class, 16,
+            "prev100:i32@0 prev10:i32@4 next10:i32@8 next100:i32@12");
     static final Layout TELTXT_SETTINGS = new Layout(Teltxt.TELTXT_Settings.class, 48,
             "devId:i32@0 pid:u16@4 type:u8@6 langCode:str4@7 magazineNumber:u8@11"
             + " pageNumber:u8@12 componetTag:u8@13 streamName:str32@14 pid:u16@46");
