@@ -204,3 +204,73 @@ TEST(DvbTeletext, BuiltinPagesTravelToLibzvbiAndBack) {
             }
     EXPECT_GT(checked, 0u);
 }
+
+// The data units of one page: 0 its header, 1 its links, 2.. rows 1..24; in each, byte 3 the
+// framing code, bytes 4.. the packet (4, 5 the address, 6.. the page number or the text).
+TEST(DvbTeletext, KeepsWhatIsSoundOfDamagedUnits) {
+    const TeletextPage original =
+            builtinBroadcast(1767290400).networks[0].transports[0].services[0].teletext[0];
+    TeletextPage pair[2] = {original, {}};
+    pair[1].number = 0x1FF;
+    const std::vector<uint8_t> pes = encodeTeletextPes(pair, 2, 0);
+    auto unit = [](int u, int at) { return size_t(46 + 46 * u + at); };
+    struct Case {
+        size_t offset;
+        uint8_t mask;
+        size_t pages;
+        uint32_t pesDropped, unitsDropped, packetsDropped, parityErrors;
+        int row, col;  // what turns blank: a row (col -1), a character, or the links (row 25)
+    } cases[] = {
+            {unit(0, 4), 0x01, 1, 0, 0, 0, 0, -1, 0},  // one bit: corrected
+            {unit(0, 4), 0x03, 0, 0, 0, 1, 0, -1, 0},  // the header's address
+            {unit(0, 6), 0x0C, 0, 0, 0, 1, 0, -1, 0},  // its page number
+            {unit(6, 5), 0x30, 1, 0, 0, 1, 0, 5, -1},  // row 5's address
+            {unit(4, 9), 0x40, 1, 0, 0, 0, 1, 3, 3},   // a character's parity
+            {unit(3, 3), 0x10, 1, 0, 1, 0, 0, 2, -1},  // a framing code
+            {unit(1, 7), 0x81, 1, 0, 0, 1, 0, 25, 0},  // a link
+            {45, 0x80, 0, 1, 0, 0, 0, -1, 0},          // the data identifier
+            {3, 0x01, 0, 1, 0, 0, 0, -1, 0},           // the stream id
+    };
+    for (const Case& c : cases) {
+        std::vector<uint8_t> damaged = pes;
+        damaged[c.offset] ^= c.mask;
+        TeletextDecoder decoder;
+        std::vector<TeletextPage> pages;
+        decoder.feed(damaged.data(), damaged.size(), 0, pages);
+        const TeletextStats& st = decoder.stats();
+        EXPECT_EQ(std::tie(st.pesDropped, st.unitsDropped, st.packetsDropped, st.parityErrors),
+                  std::tie(c.pesDropped, c.unitsDropped, c.packetsDropped, c.parityErrors))
+                << c.offset;
+        ASSERT_EQ(pages.size(), c.pages) << c.offset;
+        if (!c.pages) continue;
+        TeletextPage want = original;
+        if (c.row == 25)
+            want.links = {};
+        else if (c.row >= 0 && c.col < 0)
+            want.rows[c.row].fill(' ');
+        else if (c.row >= 0)
+            want.rows[c.row][c.col] = ' ';
+        EXPECT_EQ(std::tie(pages[0].rows, pages[0].links), std::tie(want.rows, want.links))
+                << c.offset;
+    }
+}
+
+// Bit errors everywhere; TSDuck's reading of its subtitle is all that another decoder gives.
+TEST(DvbTeletext, SurvivesTheDamagedCapture) {
+    NEED_TESTDATA("damaged-subtitles-teletext.ts");
+    TeletextDecoder decoder;
+    std::vector<TeletextPage> pages =
+            decode(capture("damaged-subtitles-teletext.ts", 0x3E), decoder);
+    std::ifstream in(DVB_TESTDATA_DIR "/truth/damaged-subtitles-teletext.json");
+    std::string srt = nlohmann::json::parse(in)["teletext"][0]["tsduck_reference_srt"]["content"];
+    std::string text;
+    for (const TeletextPage& p : pages)
+        for (const std::string& row : print(p)) text += row;
+    for (const char* line : {"Han berättade", "att hon var ute på en af ärsresa."}) {
+        EXPECT_NE(srt.find(line), std::string::npos) << line;
+        EXPECT_NE(text.find(line), std::string::npos) << line;
+    }
+    EXPECT_GE(decoder.stats().pesDropped, 1u);
+    EXPECT_GE(decoder.stats().packetsDropped, 1u);
+    EXPECT_GE(decoder.stats().parityErrors, 1u);
+}
