@@ -84,12 +84,13 @@ void TeletextDecoder::text(const uint8_t* p, uint8_t* row, size_t n) {
 }
 
 void TeletextDecoder::packet(const uint8_t* p, int64_t timeMs, std::vector<TeletextPage>& out) {
-    int address = vbi_unham16p(p);
-    if (address < 0) {
+    // Not vbi_unham16p: it shifts a negative error value left.
+    const int low = vbi_unham8(p[0]), high = vbi_unham8(p[1]);
+    if ((low | high) < 0) {
         ++stats_.packetsDropped;
         return;
     }
-    int mag = address & 7, row = address >> 3;
+    const int mag = low & 7, row = low >> 3 | high << 1;
     Magazine& m = magazines_[mag];
     if (row == 0) return header(mag, p, timeMs, out);
     // Packets 29 to 31 belong to the magazine or the service, not to the page in transmission.
