@@ -30,7 +30,7 @@ Text print(const TeletextPage& p) {
 // libzvbi's own decoding of PES packets: each page reception, printed.
 struct Zvbi {
     vbi_decoder* vbi = vbi_decoder_new();
-    std::vector<std::pair<int, Text>> pages;
+    std::vector<std::tuple<int, int, Text>> pages;  // number, subcode, text
     explicit Zvbi(const Packets& pes) {
         vbi_event_handler_register(vbi, VBI_EVENT_TTX_PAGE, &Zvbi::page, this);
         vbi_dvb_demux* dx = vbi_dvb_pes_demux_new(&Zvbi::lines, this);
@@ -45,8 +45,9 @@ struct Zvbi {
     static void page(vbi_event* e, void* user) {
         auto* z = static_cast<Zvbi*>(user);
         vbi_page pg;
-        vbi_fetch_vt_page(z->vbi, &pg, e->ev.ttx_page.pgno, e->ev.ttx_page.subno, VBI_WST_LEVEL_1p5,
-                          25, 1);
+        const int no = e->ev.ttx_page.pgno, sub = e->ev.ttx_page.subno;
+        const bool fetched =
+                vbi_fetch_vt_page(z->vbi, &pg, no, VBI_ANY_SUBNO, VBI_WST_LEVEL_1p5, 25, 1);
         Text text;
         for (int r = 0; r < 25; ++r) {
             text[r].resize(4 * 40);
@@ -54,7 +55,7 @@ struct Zvbi {
                     vbi_print_page_region(&pg, text[r].data(), 160, "UTF-8", 0, 1, 0, r, 40, 1));
         }
         text[0].erase(0, 8);
-        z->pages.emplace_back(e->ev.ttx_page.pgno, text);
+        z->pages.emplace_back(fetched ? no : -1, sub, text);
         vbi_unref_page(&pg);
     }
 };
@@ -130,8 +131,11 @@ TEST(DvbTeletext, BuiltinPagesTravelToLibzvbiAndBack) {
     for (const Network& n : builtinBroadcast(1767290400).networks)
         for (const Transport& t : n.transports)
             for (const Service& s : t.services) {
+                // Every other page with a subcode that has all four digits.
+                std::vector<TeletextPage> sent = s.teletext;
+                for (size_t i = 1; i < sent.size(); i += 2) sent[i].subcode = 0x2359;
                 Packets pes;
-                for (const TeletextPage& page : s.teletext) {
+                for (const TeletextPage& page : sent) {
                     // A time-filling header of the page's magazine completes it.
                     TeletextPage pair[2] = {page, {}};
                     pair[1].number = (page.number & 0xF00) | 0xFF;
@@ -145,25 +149,27 @@ TEST(DvbTeletext, BuiltinPagesTravelToLibzvbiAndBack) {
                 std::vector<TeletextPage> back;
                 for (const auto& p : pes) decoder.feed(p.data(), p.size(), 0, back);
                 Zvbi zvbi(pes);
-                ASSERT_EQ(back.size(), s.teletext.size());
-                ASSERT_EQ(zvbi.pages.size(), s.teletext.size());
+                ASSERT_EQ(back.size(), sent.size());
+                ASSERT_EQ(zvbi.pages.size(), sent.size());
                 for (size_t i = 0; i < back.size(); ++i, ++checked) {
-                    const TeletextPage &a = s.teletext[i], &b = back[i];
+                    const TeletextPage &a = sent[i], &b = back[i];
                     EXPECT_EQ(std::tie(a.number, a.subcode, a.controlBits, a.rows, a.links,
                                        a.charset),
                               std::tie(b.number, b.subcode, b.controlBits, b.rows, b.links,
                                        b.charset));
-                    EXPECT_EQ(zvbi.pages[i], std::make_pair(int(a.number), print(a)));
+                    EXPECT_EQ(zvbi.pages[i],
+                              std::make_tuple(int(a.number), int(a.subcode), print(a)));
                 }
             }
     EXPECT_GT(checked, 0u);
 }
 
-// The data units of one page: 0 its header, 1 its links, 2.. rows 1..24; in each, byte 3 the
+// The data units of one page: 0 its header, 1 its links, 2 its character set, 3.. rows 1..24;
+// in each, byte 3 the
 // framing code, bytes 4.. the packet (4, 5 the address, 6.. the page number or the text).
 TEST(DvbTeletext, KeepsWhatIsSoundOfDamagedUnits) {
-    const TeletextPage original =
-            builtinBroadcast(0).networks[0].transports[0].services[0].teletext[0];
+    TeletextPage original = builtinBroadcast(0).networks[0].transports[0].services[0].teletext[0];
+    original.charset = 0x15;
     TeletextPage pair[2] = {original, {}};
     pair[1].number = 0x1FF;
     const std::vector<uint8_t> pes = encodeTeletextPes(pair, 2, 0);
@@ -173,16 +179,17 @@ TEST(DvbTeletext, KeepsWhatIsSoundOfDamagedUnits) {
         uint8_t mask;
         size_t pages;
         uint32_t pesDropped, unitsDropped, packetsDropped, parityErrors;
-        int row, col;  // what turns blank: a row (col -1), a character, or the links (row 25)
+        int row, col;  // what is lost: a row (col -1), a character, the links (25) or charset (26)
     } cases[] = {
             {unit(0, 4), 0x01, 1, 0, 0, 0, 0, -1, 0},  // one bit: corrected
             {unit(0, 4), 0x03, 0, 0, 0, 1, 0, -1, 0},  // the header's address
             {unit(0, 6), 0x0C, 0, 0, 0, 1, 0, -1, 0},  // its page number
-            {unit(6, 5), 0x30, 1, 0, 0, 1, 0, 5, -1},  // row 5's address
-            {unit(4, 9), 0x40, 1, 0, 0, 0, 1, 3, 3},   // a character's parity
-            {unit(3, 3), 0x10, 1, 0, 1, 0, 0, 2, -1},  // a framing code
+            {unit(7, 5), 0x30, 1, 0, 0, 1, 0, 5, -1},  // row 5's address
+            {unit(5, 9), 0x40, 1, 0, 0, 0, 1, 3, 3},   // a character's parity
+            {unit(4, 3), 0x10, 1, 0, 1, 0, 0, 2, -1},  // a framing code
             {unit(1, 7), 0x81, 1, 0, 0, 1, 0, 25, 0},  // a link
-            {45, 0x80, 0, 1, 0, 0, 0, -1, 0},          // the data identifier
+            {unit(2, 8), 0x41, 1, 0, 0, 1, 0, 26, 0},  // the designation
+            {45, 0x20, 0, 1, 0, 0, 0, -1, 0},          // the data identifier
             {3, 0x01, 0, 1, 0, 0, 0, -1, 0},           // the stream id
     };
     for (const Case& c : cases) {
@@ -198,13 +205,16 @@ TEST(DvbTeletext, KeepsWhatIsSoundOfDamagedUnits) {
         ASSERT_EQ(pages.size(), c.pages) << c.offset;
         if (!c.pages) continue;
         TeletextPage want = original;
-        if (c.row == 25)
+        if (c.row == 26)
+            want.charset = kNoCharset;
+        else if (c.row == 25)
             want.links = {};
         else if (c.row >= 0 && c.col < 0)
             want.rows[c.row].fill(' ');
         else if (c.row >= 0)
             want.rows[c.row][c.col] = ' ';
-        EXPECT_EQ(std::tie(pages[0].rows, pages[0].links), std::tie(want.rows, want.links))
+        EXPECT_EQ(std::tie(pages[0].rows, pages[0].links, pages[0].charset),
+                  std::tie(want.rows, want.links, want.charset))
                 << c.offset;
     }
 }
