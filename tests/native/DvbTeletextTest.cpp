@@ -189,7 +189,7 @@ TEST(DvbTeletext, KeepsWhatIsSoundOfDamagedUnits) {
             {unit(4, 3), 0x10, 1, 0, 1, 0, 0, 2, -1},  // a framing code
             {unit(1, 7), 0x81, 1, 0, 0, 1, 0, 25, 0},  // a link
             {unit(2, 8), 0x41, 1, 0, 0, 1, 0, 26, 0},  // the designation
-            {45, 0x20, 0, 1, 0, 0, 0, -1, 0},          // the data identifier
+            {45, 0x30, 0, 1, 0, 0, 0, -1, 0},          // the data identifier
             {3, 0x01, 0, 1, 0, 0, 0, -1, 0},           // the stream id
     };
     for (const Case& c : cases) {
