@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <cstddef>
 #include <cstdint>
+#include <tuple>
 #include <vector>
 
 #include "Harness.h"
@@ -30,10 +31,11 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
         TeletextDecoder again;
         std::vector<TeletextPage> back;
         again.feed(pes.data(), pes.size(), 0, back);
-        FUZZ_CHECK(back.size() == 1 && back[0].number == page.number);
-        FUZZ_CHECK(back[0].subcode == page.subcode && back[0].controlBits == page.controlBits);
-        FUZZ_CHECK(back[0].rows == page.rows && back[0].links == page.links);
-        FUZZ_CHECK(back[0].charset == page.charset);
+        FUZZ_CHECK(back.size() == 1);
+        FUZZ_CHECK(std::tie(back[0].number, back[0].subcode, back[0].controlBits, back[0].rows,
+                            back[0].links, back[0].charset) == std::tie(page.number, page.subcode,
+                                                                        page.controlBits, page.rows,
+                                                                        page.links, page.charset));
     }
     return 0;
 }
