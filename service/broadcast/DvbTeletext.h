@@ -65,7 +65,8 @@ private:
 // when it carries a character set designation, then X/1..X/24. Links go with "any subcode".
 // The PES header is padded to the fixed 45 bytes of EN 300 472 and the packet is filled with
 // stuffing units to a whole number of 184-byte transport payloads. Pages that do not fit one
-// PES (more than 1400 data units) give an empty result.
+// PES (its length field past 65535 bytes: over 1423 data units, some 54 pages) give an empty
+// result.
 std::vector<uint8_t> encodeTeletextPes(const TeletextPage* pages, size_t count, uint64_t pts);
 
 }  // namespace dvbmodel
