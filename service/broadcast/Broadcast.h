@@ -165,6 +165,9 @@ struct DisplaySet {
 // The page list is a sequence of transmissions: a transmission stays the current version of its
 // number and subcode until a later one of the same number and subcode; a decoder that shows a
 // number shows the subpage transmitted last. Rotating subpages are so many transmissions.
+// TeletextPage::charset where the broadcast designates no character set.
+constexpr uint8_t kNoCharset = 0xFF;
+
 struct TeletextPage {
     int64_t time = 0;  // milliseconds from the start of the broadcast's loop: when it is sent
     uint16_t number = 0x100;  // magazine * 0x100 + page, in BCD: 0x100 .. 0x8FF
@@ -172,6 +175,9 @@ struct TeletextPage {
     uint16_t controlBits = 0;  // C4 .. C14 as bits 4 .. 14 (C11 serial, C12..C14 national option)
     std::array<std::array<uint8_t, 40>, 25> rows{};
     std::array<uint16_t, 6> links{};  // FLOF links: red, green, yellow, cyan, next, index (0: none)
+    // Default G0/G2 character set designation of the page's X/28/0 or its magazine's M/29/0
+    // (7 bits: character set group, then C12..C14's national option), where one is sent.
+    uint8_t charset = kNoCharset;
 };
 
 struct Service {

@@ -193,4 +193,32 @@ TeletextCells renderTeletext(const TeletextRows& rows, int option) {
     return image;
 }
 
+std::array<std::string, 25> teletextText(const TeletextRows& rows, int option) {
+    std::array<std::string, 25> text;
+    for (int r = 0; r < 25; ++r) {
+        bool mosaic = false, doubleHeight = false;
+        for (uint8_t b : rows[r]) {
+            b &= 0x7F;
+            mosaic = b < 0x08 ? false : b >= 0x10 && b < 0x18 ? true : mosaic;
+            doubleHeight |= b == kDoubleHeight;
+            const char32_t u = b < 0x20 || (mosaic && (b & 0x20)) ? U' ' : teletextG0(b, option);
+            if (u < 0x80) {
+                text[r] += static_cast<char>(u);
+            } else if (u < 0x800) {
+                text[r] += {static_cast<char>(0xC0 | u >> 6), static_cast<char>(0x80 | (u & 0x3F))};
+            } else {
+                text[r] += {static_cast<char>(0xE0 | u >> 12),
+                            static_cast<char>(0x80 | (u >> 6 & 0x3F)),
+                            static_cast<char>(0x80 | (u & 0x3F))};
+            }
+        }
+        // Double height takes effect on rows 1 to 22.
+        if (doubleHeight && r >= 1 && r <= 22) {
+            text[r + 1] = text[r];
+            ++r;
+        }
+    }
+    return text;
+}
+
 }  // namespace dvbrx

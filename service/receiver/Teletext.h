@@ -6,6 +6,7 @@
 
 #include <array>
 #include <cstdint>
+#include <string>
 
 #include <Record.h>
 
@@ -56,6 +57,12 @@ char32_t teletextMosaic(uint8_t code);
 // character hides the row under it, which shows the lower halves instead; double height takes
 // effect on rows 1 to 22 only.
 TeletextCells renderTeletext(const TeletextRows& rows, int option);
+
+// The text of a page as libzvbi prints it at level 1.5, 25 rows of 40 characters in UTF-8, for
+// logs, the demo and comparisons with libzvbi: spacing attributes and block mosaics as spaces,
+// 0x00 and 0x10 switching to alphanumerics and mosaics as they do from level 1.5 on, and the
+// row under a row with double height a copy of it.
+std::array<std::string, 25> teletextText(const TeletextRows& rows, int option);
 
 // The page image that Teltxt::GetData delivers, little-endian (README "Teletext data").
 struct TeltxtCellRecord {
