@@ -12,6 +12,7 @@ import java.time.Instant;
 import java.time.ZoneOffset;
 import java.time.format.DateTimeFormatter;
 import java.util.ArrayList;
+import java.util.Arrays;
 import java.util.Comparator;
 import java.util.LinkedHashMap;
 import java.util.List;
@@ -25,7 +26,9 @@ import javax.imageio.ImageIO;
  * The whole android.DVB API against the receiver behind it: start-up, a scan of each delivery
  * system, the channel list, a service played with its status, components and events, its
  * schedule for tomorrow from the event database, a subtitle display set and a teletext page
- * written as PNGs, then shut-down. Options: --service NAME-OR-NUMBER, --page NNN, --out DIR.
+ * written as PNGs, then shut-down. Options: --service NAME-OR-NUMBER, --page NNN, --out DIR,
+ * --broadcast PATH (a capture, a folder of captures or a broadcast file instead of the built-in
+ * broadcast: the receiver reads it from DVB_BROADCAST, so the demo runs again with it set).
  */
 public final class Demo {
     static final DateTimeFormatter TIME = DateTimeFormatter.ofPattern("EEE HH:mm").withZone(ZoneOffset.UTC);
@@ -59,10 +62,31 @@ public final class Demo {
             if (args[i].equals("--service")) service = args[i + 1];
             else if (args[i].equals("--page")) page = Integer.parseInt(args[i + 1], 16);
             else if (args[i].equals("--out")) out = new File(args[i + 1]);
+            else if (args[i].equals("--broadcast") && !args[i + 1].equals(System.getenv("DVB_BROADCAST"))) {
+                System.exit(relaunch(args, args[i + 1]));
+            }
         }
         out.mkdirs();
         new Demo(service, page, out).run();
         System.exit(0);
+    }
+
+    /** Runs the demo in a JVM of its own with DVB_BROADCAST set to `broadcast`; gives its exit code. */
+    static int relaunch(String[] args, String broadcast) throws IOException, InterruptedException {
+        List<String> cmd = new ArrayList<>();
+        cmd.add(System.getProperty("java.home") + "/bin/java");
+        cmd.addAll(java.lang.management.ManagementFactory.getRuntimeMXBean().getInputArguments());
+        cmd.addAll(Arrays.asList("-cp", System.getProperty("java.class.path"), Demo.class.getName()));
+        cmd.addAll(Arrays.asList(args));
+        ProcessBuilder pb = new ProcessBuilder(cmd).inheritIO();
+        pb.environment().put("DVB_BROADCAST", broadcast);
+        return pb.start().waitFor();
+    }
+
+    /** Whether the receiver plays captures rather than its built-in broadcast. */
+    static boolean capture() {
+        String b = System.getenv("DVB_BROADCAST");
+        return b != null && !b.isEmpty() && !b.equals("builtin");
     }
 
     static void title(String text) {
@@ -86,10 +110,18 @@ public final class Demo {
         System.out.println("Dvb_SystemInit -> " + scnm.Dvb_SystemInit(config) + " (the event database exists)");
 
         List<Channel> channels = new ArrayList<>();
-        scan(scnm, "Satellite 19.2E", satellite(11362000, 22000000, 1, 1, 0, 192), channels);
-        scan(scnm, "Satellite 13.0E", satellite(10719000, 27500000, 0, 2, 1, 130), channels);
-        scan(scnm, "Cable", cable(394000), channels);
-        scan(scnm, "Terrestrial", terrestrial(506000), channels);
+        if (capture()) {
+            // Where the captures' transponders are is theirs to say: sweep every band.
+            System.out.println("broadcast: " + System.getenv("DVB_BROADCAST"));
+            scan(scnm, "Terrestrial, full band", terrestrial(474000), 2, channels);
+            scan(scnm, "Cable, full band", cable(306000), 2, channels);
+            scan(scnm, "Satellite 19.2E, full band", satellite(10714000, 27500000, 0, 10, 0, 192), 2, channels);
+        } else {
+            scan(scnm, "Satellite 19.2E", satellite(11362000, 22000000, 1, 1, 0, 192), 1, channels);
+            scan(scnm, "Satellite 13.0E", satellite(10719000, 27500000, 0, 2, 1, 130), 1, channels);
+            scan(scnm, "Cable", cable(394000), 1, channels);
+            scan(scnm, "Terrestrial", terrestrial(506000), 1, channels);
+        }
 
         title("Channel list");
         channels.sort(Comparator.comparingLong(c -> c.info.lcn));
@@ -98,8 +130,13 @@ public final class Demo {
             System.out.printf("%4d  %-30s %-6s %s%s%n", c.info.lcn, c.name, type,
                     c.info.caSysId0 != 0 ? "scrambled " : "", delivery(c.scan.type));
         }
-        Channel chosen = choose(channels);
-        play(chosen);
+        if (channels.isEmpty()) {
+            System.out.println("no service found");
+        } else {
+            Channel chosen = choose(channels);
+            Components shown = play(chosen);
+            if (capture()) others(chosen, shown, channels);
+        }
 
         title("Shut-down");
         System.out.println("Dvb_SystemUnInit -> " + scnm.Dvb_SystemUnInit(config));
@@ -144,13 +181,16 @@ public final class Demo {
         return s;
     }
 
-    /** A network scan from one transponder, with a progress bar, adding what it found. */
-    void scan(Scnm scnm, String what, Scnm.SCNM_StartSettings settings, List<Channel> channels)
+    /**
+     * A scan (type 1: the network of one transponder, from its NIT; 2: the full band) with a
+     * progress bar, adding what it found.
+     */
+    void scan(Scnm scnm, String what, Scnm.SCNM_StartSettings settings, int type, List<Channel> channels)
             throws InterruptedException {
         title("Scan: " + what);
         Scnm.SCNM_OpenSettings open = new Scnm.SCNM_OpenSettings();
         long handle = scnm.Scnm_Open(open);
-        settings.scanType = 1; // the network's transponders, from its NIT
+        settings.scanType = type;
         settings.langCode = "eng";
         int started = scnm.Scnm_Start(handle, settings);
         Scnm.SCNM_GetStatus status = new Scnm.SCNM_GetStatus();
@@ -186,7 +226,7 @@ public final class Demo {
 
     Channel choose(List<Channel> channels) {
         for (Channel c : channels) {
-            if (wantedService == null ? c.info.svcType != 2 && c.name.contains("Kanal Eins HD")
+            if (wantedService == null ? c.info.svcType != 2 && (c.name.contains("Kanal Eins HD") || capture())
                     : c.name.equalsIgnoreCase(wantedService) || wantedService.equals("" + c.info.lcn)) {
                 return c;
             }
@@ -212,8 +252,14 @@ public final class Demo {
         return f;
     }
 
-    void play(Channel c) throws Exception {
-        title("Playing " + c.info.lcn + " " + c.name);
+    /** What a played service carries: its first subtitle component and its teletext pages. */
+    static final class Components {
+        Strm.SubtitleContent subtitle;
+        final List<Strm.TeletextContent> teletext = new ArrayList<>();
+    }
+
+    /** Opens a stream and starts `c` on the first of its network's transponders that carries it. */
+    long start(Channel c) {
         Strm strm = dvb.getStrm();
         Strm.STRM_OpenSettings open = new Strm.STRM_OpenSettings();
         open.szPath = "";
@@ -235,7 +281,48 @@ public final class Demo {
             started = strm.Strm_Start(handle, svc, langs, frontEnd(c.scan, t));
             if (started == 0) break;
         }
-        System.out.println("Strm_Start -> " + started);
+        System.out.println("Strm_Start " + c.name + " -> " + started);
+        return handle;
+    }
+
+    /** The components of the service stream `handle` plays, printed when `print`. */
+    static Components components(Strm strm, long handle, boolean print) {
+        Strm.STRM_StreamInfo info = new Strm.STRM_StreamInfo();
+        strm.Strm_CreatStreamInfo(handle, info);
+        Components found = new Components();
+        if (print) System.out.printf("components: PCR PID %d, CA %04x%n", info.pcrPid, info.caSysId0);
+        for (int i = 0; i < info.videoCount && print; i++) {
+            Strm.VideoContent v = new Strm.VideoContent();
+            strm.Strm_GetVideoStreamInfo(i, v);
+            System.out.printf("  video    PID %4d type 0x%02x%n", v.pid, v.type);
+        }
+        for (int i = 0; i < info.audioCount && print; i++) {
+            Strm.AudioContent a = new Strm.AudioContent();
+            strm.Strm_GetAudioStreamInfo(i, a);
+            System.out.printf("  audio    PID %4d type 0x%02x %s%s %s%n", a.pid, a.type, a.langCode0,
+                    a.isDolbyAC3 != 0 ? " AC-3" : "", a.streamName);
+        }
+        for (int i = 0; i < info.subtitleCount; i++) {
+            Strm.SubtitleContent s = new Strm.SubtitleContent();
+            strm.Strm_GetSubTilteStreamInfo(i, s);
+            if (found.subtitle == null) found.subtitle = s;
+            if (print) System.out.printf("  subtitle PID %4d type 0x%02x %s pages %d/%d%n", s.pid, s.type,
+                    s.langCode, s.compositionPageId, s.ancillaryPageId);
+        }
+        for (int i = 0; i < info.teletextCount; i++) {
+            Strm.TeletextContent t = new Strm.TeletextContent();
+            strm.Strm_GetTeleTextStreamInfo(i, t);
+            found.teletext.add(t);
+            if (print) System.out.printf("  teletext PID %4d %s page %d%02x type %d %s%n", t.pid, t.langCode,
+                    t.magazineNumber, t.pageNumber, t.type, t.streamName);
+        }
+        return found;
+    }
+
+    Components play(Channel c) throws Exception {
+        title("Playing " + c.info.lcn + " " + c.name);
+        Strm strm = dvb.getStrm();
+        long handle = start(c);
         Strm.STRM_GetStatus st = new Strm.STRM_GetStatus();
         for (int i = 0; i < 100 && (st.feStatus & 0x10) == 0; i++) {
             Thread.sleep(20);
@@ -247,45 +334,59 @@ public final class Demo {
                 st.feStatus, st.feStrength, st.feSnr / 10.0, st.videoPts & 0xFFFFFFFFL, st.fpsInteger,
                 st.fpsDecimal, st.pictureStatus);
 
-        Strm.STRM_StreamInfo info = new Strm.STRM_StreamInfo();
-        strm.Strm_CreatStreamInfo(handle, info);
-        System.out.printf("components: PCR PID %d, CA %04x%n", info.pcrPid, info.caSysId0);
-        Strm.SubtitleContent subtitle = null;
-        Strm.TeletextContent teletext = null;
-        for (int i = 0; i < info.videoCount; i++) {
-            Strm.VideoContent v = new Strm.VideoContent();
-            strm.Strm_GetVideoStreamInfo(i, v);
-            System.out.printf("  video    PID %4d type 0x%02x%n", v.pid, v.type);
-        }
-        for (int i = 0; i < info.audioCount; i++) {
-            Strm.AudioContent a = new Strm.AudioContent();
-            strm.Strm_GetAudioStreamInfo(i, a);
-            System.out.printf("  audio    PID %4d type 0x%02x %s%s %s%n", a.pid, a.type, a.langCode0,
-                    a.isDolbyAC3 != 0 ? " AC-3" : "", a.streamName);
-        }
-        for (int i = 0; i < info.subtitleCount; i++) {
-            Strm.SubtitleContent s = new Strm.SubtitleContent();
-            strm.Strm_GetSubTilteStreamInfo(i, s);
-            subtitle = subtitle == null ? s : subtitle;
-            System.out.printf("  subtitle PID %4d type 0x%02x %s pages %d/%d%n", s.pid, s.type, s.langCode,
-                    s.compositionPageId, s.ancillaryPageId);
-        }
-        for (int i = 0; i < info.teletextCount; i++) {
-            Strm.TeletextContent t = new Strm.TeletextContent();
-            strm.Strm_GetTeleTextStreamInfo(i, t);
-            teletext = teletext == null ? t : teletext;
-            System.out.printf("  teletext PID %4d %s page %d%02x %s%n", t.pid, t.langCode, t.magazineNumber,
-                    t.pageNumber, t.streamName);
-        }
+        Components found = components(strm, handle, true);
 
         events(strm, handle);
         schedule(strm, handle, c);
-        if (subtitle != null) subtitles(handle, subtitle);
-        if (teletext != null) teletext(handle, teletext);
+        if (found.subtitle != null) subtitles(handle, found.subtitle, capture() ? 20 : 1);
+        if (!found.teletext.isEmpty()) pages(handle, found.teletext);
+        stop(strm, handle);
+        return found;
+    }
 
+    static void stop(Strm strm, long handle) {
         System.out.println();
         System.out.println("Strm_Stop -> " + strm.Strm_Stop(handle, false) + ", Strm_Close -> "
                 + strm.Strm_Close(handle));
+    }
+
+    /**
+     * On captures: the subtitles of the first service that carries a subtitle component and
+     * the teletext of the first that carries teletext, where the service played had none.
+     */
+    void others(Channel played, Components shown, List<Channel> channels) throws Exception {
+        Strm strm = dvb.getStrm();
+        boolean subtitles = shown.subtitle != null, teletext = !shown.teletext.isEmpty();
+        for (Channel c : channels) {
+            if (c == played || (subtitles && teletext)) continue;
+            long handle = start(c);
+            Components found = components(strm, handle, false);
+            if (!subtitles && found.subtitle != null) {
+                subtitles = true;
+                subtitles(handle, found.subtitle, 20);
+            }
+            if (!teletext && !found.teletext.isEmpty()) {
+                teletext = true;
+                pages(handle, found.teletext);
+            }
+            strm.Strm_Stop(handle, false);
+            strm.Strm_Close(handle);
+        }
+    }
+
+    /**
+     * The page asked for (100 unless --page says otherwise; the first page the service's
+     * teletext announces where the page asked for is not on the air), then every subtitle page
+     * it announces.
+     */
+    void pages(long stream, List<Strm.TeletextContent> announced) throws IOException {
+        Strm.TeletextContent first = announced.get(0);
+        int shown = teletext(stream, first, page);
+        if (shown != 0) teletext(stream, first, first.magazineNumber % 8 * 0x100 + (first.pageNumber & 0xFF));
+        for (Strm.TeletextContent t : announced) {
+            int number = (t.magazineNumber == 0 ? 8 : t.magazineNumber) * 0x100 + (t.pageNumber & 0xFF);
+            if ((t.type == 2 || t.type == 5) && number != page) teletext(stream, t, number);
+        }
     }
 
     static void printEvent(String which, Strm.EpgEvent e) {
@@ -340,9 +441,12 @@ public final class Demo {
         }
     }
 
-    /** Waits for a display set with regions and writes it, composed on the display, as a PNG. */
-    void subtitles(long stream, Strm.SubtitleContent content) throws InterruptedException, IOException {
-        title("Subtitles");
+    /**
+     * Writes up to `count` display sets with regions, each composed on the display, as PNGs;
+     * gives up when no new one comes within 3 seconds.
+     */
+    void subtitles(long stream, Strm.SubtitleContent content, int count) throws InterruptedException, IOException {
+        title("Subtitles, PID " + content.pid);
         Subttl sub = dvb.getSubttl();
         sub.Subttl_Init();
         Subttl.SUBTTL_Settings s = new Subttl.SUBTTL_Settings();
@@ -353,11 +457,22 @@ public final class Demo {
         s.ancillaryPageId = content.ancillaryPageId;
         s.hstrm = stream;
         long handle = sub.Subttl_Start(s);
-        Subttl.SUBTTL_Data_t data = new Subttl.SUBTTL_Data_t();
-        for (int i = 0; i < 200 && data.numRegions == 0; i++) {
-            Thread.sleep(20);
+        for (int written = 0, guard = 0; written < count && guard < 200; guard++) {
+            int[] e = await(240, 3);
+            if (e == null) break;
+            if (e[1] != (int) handle || e[2] == 0) continue;
+            Subttl.SUBTTL_Data_t data = new Subttl.SUBTTL_Data_t();
             sub.Subttl_GetData(handle, data);
+            if (data.numRegions == 0) continue;
+            compose(data, new File(out, count == 1 ? "subtitle.png" : String.format("subtitle-%02d.png", ++written)));
+            if (count == 1) break;
         }
+        sub.Subttl_Stop(handle);
+    }
+
+    /** The display set just read, its regions placed on the display in their CLUTs' colours, as a PNG. */
+    void compose(Subttl.SUBTTL_Data_t data, File png) throws IOException {
+        Subttl sub = dvb.getSubttl();
         Subttl.SUBTTL_Display display = new Subttl.SUBTTL_Display();
         sub.Subttl_GetDisplayData(display);
         int width = display.i_width > 0 ? display.i_width : 720;
@@ -392,11 +507,9 @@ public final class Demo {
                 }
             }
         }
-        File png = new File(out, "subtitle.png");
         ImageIO.write(image, "png", png);
         System.out.printf("display set at PTS %d: %d regions, %d CLUTs, page %d -> %s%n",
                 data.i_pts & 0xFFFFFFFFL, data.numRegions, data.numCluts, pg.i_id, png);
-        sub.Subttl_Stop(handle);
     }
 
     /** The 2-by-3 cells of a block mosaic character (bit 0 top left ... bit 5 bottom right), or -1. */
@@ -414,8 +527,11 @@ public final class Demo {
     /** Teletext's colours in its order, which is also the order of the terminal's colours. */
     static final int[] RGB = {0x000000, 0xFF0000, 0x00FF00, 0xFFFF00, 0x0000FF, 0xFF00FF, 0x00FFFF, 0xFFFFFF};
 
-    /** Shows page `page` as coloured text on the terminal and writes it as a PNG. */
-    void teletext(long stream, Strm.TeletextContent content) throws IOException {
+    /**
+     * Shows page `page` as coloured text on the terminal and writes it as a PNG; gives
+     * Teltxt_SetData's result (nothing is shown where it is not 0).
+     */
+    int teletext(long stream, Strm.TeletextContent content, int page) throws IOException {
         title("Teletext page " + Integer.toHexString(page));
         Teltxt ttx = dvb.getTeltxt();
         Teltxt.TELTXT_Settings s = new Teltxt.TELTXT_Settings();
@@ -429,6 +545,11 @@ public final class Demo {
         long handle = ttx.Teltxt_Start(s);
         Teltxt.TELTXT_NavPages nav = new Teltxt.TELTXT_NavPages();
         int selected = ttx.Teltxt_SetData(handle, page, 0, nav);
+        if (selected != 0) {
+            System.out.println("Teltxt_SetData -> " + selected + ": not on the air");
+            ttx.Teltxt_Stop(handle);
+            return selected;
+        }
         byte[] image = new byte[8032];
         ttx.Teltxt_GetData(handle, 0, image.length, image);
         java.nio.ByteBuffer b = java.nio.ByteBuffer.wrap(image).order(java.nio.ByteOrder.LITTLE_ENDIAN);
@@ -474,5 +595,6 @@ public final class Demo {
         ImageIO.write(png, "png", file);
         System.out.println("-> " + file);
         ttx.Teltxt_Stop(handle);
+        return 0;
     }
 }
