@@ -24,8 +24,9 @@
 //
 // Time: Broadcast.start is the first capture's first TDT/TOT UTC; else the modification time
 // of its file; else `start`. Broadcast.loopMillis is the longest capture's duration (from its
-// PCR, else its PTS, else its TDT/TOT). The same transport read from several captures: the
-// capture it is the actual transport of wins over what others tell of it.
+// PCR, else its PTS, else its TDT/TOT; at least to its last display set or teletext page).
+// The same transport read from several captures: the capture it is the actual transport of
+// wins over what others tell of it.
 #pragma once
 
 #include <cstdint>

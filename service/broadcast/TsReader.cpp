@@ -1021,6 +1021,18 @@ void Reader::build(TsCapture& out) {
     out.durationMs = out.pcrDurationMs > 0   ? out.pcrDurationMs
                      : out.ptsDurationMs > 0 ? out.ptsDurationMs
                                              : out.tdtDurationMs;
+    // A PTS runs ahead of the PCR by the decoder's delay: the loop holds the last display set
+    // or teletext transmission too.
+    for (const Network& n : out.networks) {
+        for (const Transport& t : n.transports) {
+            for (const Service& s : t.services) {
+                if (!s.subtitles.empty())
+                    out.durationMs = std::max(out.durationMs, s.subtitles.back().time + 1);
+                if (!s.teletext.empty())
+                    out.durationMs = std::max(out.durationMs, s.teletext.back().time + 1);
+            }
+        }
+    }
 }
 
 bool Reader::read(const uint8_t* d, size_t size, const std::string& name, TsCapture& out,
