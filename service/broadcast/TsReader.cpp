@@ -980,7 +980,8 @@ void Reader::build(TsCapture& out) {
             if (sdt != sdts_.end()) tr.services = sdt->second;
             if (actual) {
                 // Services of the PAT that the SDT does not list, then every PMT's streams.
-                for (const auto& [program, pid] : programs_) {
+                for (const auto& entry : programs_) {
+                    const uint16_t program = entry.first, pid = entry.second;
                     auto has = std::find_if(tr.services.begin(), tr.services.end(),
                                             [&](const Service& s) { return s.id == program; });
                     if (has == tr.services.end()) {
