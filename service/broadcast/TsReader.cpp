@@ -800,9 +800,9 @@ void Reader::timedContent(const uint8_t* d, size_t begin, size_t size) {
         return std::max<int64_t>(0, delta / 90);
     };
     struct Stream {
+        Stream(uint16_t p, Service* s) : pid(p), service(s), assembler(p) {}
         uint16_t pid;
         Service* service;
-        size_t component;
         PesAssembler assembler;
         std::unique_ptr<DvbSubtitleDecoder> subtitles;
 #ifdef DVB_HAS_TELETEXT
@@ -812,19 +812,16 @@ void Reader::timedContent(const uint8_t* d, size_t begin, size_t size) {
     };
     std::vector<Stream> streams;
     for (auto& [program, s] : pmtServices_) {
-        for (size_t i = 0; i < s.components.size(); ++i) {
-            const Component& c = s.components[i];
+        for (const Component& c : s.components) {
             if (c.kind == Kind::Subtitle) {
-                streams.push_back({c.pid, &s, i, PesAssembler(c.pid),
-                                   std::make_unique<DvbSubtitleDecoder>(c.compositionPageId,
-                                                                        c.ancillaryPageId)});
+                Stream& st = streams.emplace_back(c.pid, &s);
+                st.subtitles = std::make_unique<DvbSubtitleDecoder>(c.compositionPageId,
+                                                                    c.ancillaryPageId);
             }
 #ifdef DVB_HAS_TELETEXT
             // The teletext PES of a service go to the teletext decoder here, and only here.
             if (c.kind == Kind::Teletext) {
-                Stream t{c.pid, &s, i, PesAssembler(c.pid), nullptr};
-                t.teletext = std::make_unique<TeletextDecoder>();
-                streams.push_back(std::move(t));
+                streams.emplace_back(c.pid, &s).teletext = std::make_unique<TeletextDecoder>();
             }
 #endif
         }
