@@ -3,13 +3,13 @@
 #include <gtest/gtest.h>
 
 #include <unistd.h>
-#include <cstdio>
 #include <ctime>
 #include <filesystem>
 #include <fstream>
 #include <map>
 #include <nlohmann/json.hpp>
 #include <set>
+#include <sstream>
 #include <tuple>
 
 #include "broadcast/BroadcastSource.h"
@@ -43,11 +43,6 @@ int64_t utc(const std::string& iso) {  // 2019-01-22T12:30:00Z
     std::tm tm{};
     strptime(iso.c_str(), "%Y-%m-%dT%H:%M:%SZ", &tm);
     return timegm(&tm);
-}
-
-int64_t hms(const std::string& s) {
-    return std::stoi(s.substr(0, 2)) * 3600 + std::stoi(s.substr(3, 2)) * 60 +
-           std::stoi(s.substr(6, 2));
 }
 
 struct Loaded {
@@ -91,10 +86,7 @@ TEST(TsReader, FrenchMultiplexMatchesItsTruth) {
     size_t services = 0;
     for (const json& sdt : t["sdt"]) {
         for (const json& s : sdt["services"]) {
-            const Service* got = l.services.count({sdt["onid"], sdt["tsid"], s["sid"]})
-                                         ? l.services.at({sdt["onid"], sdt["tsid"], s["sid"]})
-                                         : nullptr;
-            ASSERT_NE(got, nullptr) << s["sid"];
+            const Service* got = l.services.at({sdt["onid"], sdt["tsid"], s["sid"]});
             EXPECT_EQ(got->type, s["service_type"]) << s["sid"];
             EXPECT_EQ(got->name, unhex(s["name"]["hex"])) << s["sid"];
             EXPECT_EQ(got->provider, unhex(s["provider"]["hex"])) << s["sid"];
@@ -128,38 +120,33 @@ TEST(TsReader, FrenchMultiplexMatchesItsTruth) {
         }
     }
 
-    // EIT present/following: every event of every service, text as broadcast bytes.
+    // EIT present/following and schedule: every event of every service, merged by event id.
     std::map<const Service*, std::set<int>> ids;
-    for (const auto& [name, svc] : t["eit_pf"]["services"].items()) {
+    auto check = [&](const json& svc, const json& e, int64_t duration, const json& name,
+                     const json& text, const json& ext) {
         const Service* s = l.services.at({svc["onid"], svc["tsid"], svc["sid"]});
+        const Event* got = find(s, e["event_id"]);
+        ASSERT_NE(got, nullptr) << svc["sid"] << " " << e["event_id"];
+        ids[s].insert(int(e["event_id"]));
+        EXPECT_EQ(got->start, utc(e["start_utc"])) << e["event_id"];
+        EXPECT_EQ(got->duration, duration) << e["event_id"];
+        EXPECT_EQ(got->name, unhex(name)) << e["event_id"];
+        EXPECT_EQ(decodeText(got->text), text) << e["event_id"];
+        EXPECT_EQ(decodeText(got->extendedText), ext.empty() ? "" : ext.begin().value());
+    };
+    for (const auto& [name, svc] : t["eit_pf"]["services"].items()) {
         for (const char* part : {"present", "following"}) {
-            if (!svc.contains(part)) continue;
-            for (const json& e : svc[part]["events"]) {
-                const Event* got = find(s, e["event_id"]);
-                ASSERT_NE(got, nullptr) << name << " " << e["event_id"];
-                ids[s].insert(int(e["event_id"]));
-                EXPECT_EQ(got->start, utc(e["start_utc"])) << e["event_id"];
-                EXPECT_EQ(got->duration, e["duration"]["seconds"]);
-                EXPECT_EQ(got->name, unhex(e["short_events"][0]["name"]["hex"]));
-                EXPECT_EQ(got->text, unhex(e["short_events"][0]["text"]["hex"]));
-                const json ext = e.value("extended_text_concatenated", json::object());
-                EXPECT_EQ(decodeText(got->extendedText), ext.empty() ? "" : ext.begin().value())
-                        << e["event_id"];
+            for (const json& e : svc.value(part, json::object()).value("events", json::array())) {
+                const json& se = e["short_events"][0];
+                check(svc, e, e["duration"]["seconds"], se["name"]["hex"], se["text"]["utf8"],
+                      e.value("extended_text_concatenated", json::object()));
             }
         }
     }
-    // EIT schedule: every event, merged with p/f by event id.
     for (const auto& [name, svc] : t["eit_schedule"]["services"].items()) {
-        const Service* s = l.services.at({svc["onid"], svc["tsid"], svc["sid"]});
         for (const json& e : svc["events"]) {
-            const Event* got = find(s, e["event_id"]);
-            ASSERT_NE(got, nullptr) << name << " " << e["event_id"];
-            ids[s].insert(int(e["event_id"]));
-            EXPECT_EQ(got->start, utc(e["start_utc"])) << e["event_id"];
-            EXPECT_EQ(got->duration, hms(e["duration"]));
-            EXPECT_EQ(got->name, unhex(e["name_hex"]));
-            EXPECT_EQ(decodeText(got->text), e["text_utf8"]);
-            EXPECT_EQ(decodeText(got->extendedText), e["extended_text_utf8"].begin().value());
+            check(svc, e, utc("1970-01-01T" + e["duration"].get<std::string>() + "Z"),
+                  e["name_hex"], e["text_utf8"], e["extended_text_utf8"]);
         }
     }
     for (const auto& [s, set] : ids) EXPECT_EQ(s->events.size(), set.size()) << s->id;
@@ -252,74 +239,59 @@ TEST(TsReader, SettingErrorsNameTheFileAndLine) {
         return (dir / name).string();
     };
     const std::string notTs = write("notes.ts", "Good grief, this is text\n");
-    struct Case {
-        std::string setting, error;
-    } cases[] = {
+    const std::string absent = (dir / "absent.ts").string(), x = (dir / "x.ts").string();
+    std::vector<std::pair<std::string, std::string>> cases = {
             {notTs, notTs + ": not an MPEG transport stream"},
-            {(dir / "absent.ts").string(), "absent.ts: no such file or folder"},
-            {write("a.broadcast", "# nothing\n\n"), "a.broadcast: lists no capture"},
-            {write("b.broadcast", "# c\nx.ts satellite 11494000 22000000\n"),
-             "b.broadcast:2: satellite needs a symbol rate and a polarization"},
-            {write("c.broadcast", "x.ts terrestrial 586000 8000\ny.ts cable\n"),
-             "c.broadcast:2: 'cable' needs a frequency in kHz"},
-            {write("d.broadcast", "x.ts dab 1\n"), "d.broadcast:1: unknown delivery 'dab'"},
-            {write("e.broadcast", "x.ts terrestrial 0\n"), "e.broadcast:1: bad frequency '0'"},
-            {write("f.broadcast", "x.ts terrestrial 586000 8500\n"),
-             "f.broadcast:1: bad bandwidth"},
-            {write("g.broadcast", "x.ts cable 306000 6900000 qam1024\n"),
-             "g.broadcast:1: bad modulation"},
-            {write("h.broadcast", "x.ts satellite 11494000 22000000 x\n"),
-             "h.broadcast:1: bad polarization"},
-            {write("i.broadcast", "x.ts satellite 11494000 22000000 h 19.2N\n"),
-             "i.broadcast:1: bad orbital position"},
-            {write("j.broadcast", "x.ts terrestrial 586000 8000 9\n"),
-             "j.broadcast:1: too many fields"},
-            {write("k.broadcast", "x.ts   # a capture\n"),
-             (dir / "x.ts").string() + ": cannot read"},
+            {absent, absent + ": no such file or folder"},
+            {write("x.broadcast", "x.ts   # a capture\n"), x + ": cannot read"},
     };
-    for (const Case& c : cases) {
+    const std::pair<const char*, const char*> files[] = {
+            {"# nothing\n\n", ": lists no capture"},
+            {"# c\nx.ts satellite 11494000 22000000\n", ":2: satellite needs a symbol rate"},
+            {"x.ts terrestrial 586000 8000\ny.ts cable\n", ":2: 'cable' needs a frequency"},
+            {"x.ts dab 1\n", ":1: unknown delivery 'dab'"},
+            {"x.ts terrestrial 0\n", ":1: bad frequency '0'"},
+            {"x.ts terrestrial 586000 8500\n", ":1: bad bandwidth"},
+            {"x.ts cable 306000 6900000 qam1024\n", ":1: bad modulation"},
+            {"x.ts satellite 11494000 22000000 x\n", ":1: bad polarization"},
+            {"x.ts satellite 11494000 22000000 h 19.2N\n", ":1: bad orbital position"},
+            {"x.ts terrestrial 586000 8000 9\n", ":1: too many fields"},
+    };
+    for (const auto& [text, error] : files) {
+        const std::string path = write(std::to_string(cases.size()) + ".broadcast", text);
+        cases.push_back({path, path + error});
+    }
+    for (const auto& [setting, want] : cases) {
         Broadcast b;
         std::string error;
-        EXPECT_FALSE(loadBroadcast(c.setting, 0, b, error, nullptr)) << c.setting;
-        EXPECT_NE(error.find(c.error), std::string::npos) << error << " / " << c.error;
+        EXPECT_FALSE(loadBroadcast(setting, 0, b, error, nullptr)) << setting;
+        EXPECT_EQ(error.substr(0, want.size()), want);
         EXPECT_TRUE(b.networks.empty());
     }
     fs::remove_all(dir);
 }
 
+// Tuning as "delivery kHz symbols/s bandwidth modulation polarization orbit", in model codes.
 TEST(TsReader, BroadcastLinesGiveTheirTuning) {
-    struct Case {
-        const char* line;
-        Delivery delivery;
-        uint32_t khz, rate, bandwidth;
-        Modulation modulation;
-        Polarization pol;
-        int16_t orbit;
-    } cases[] = {
-            {"a.ts terrestrial 586000", Delivery::Terrestrial, 586000, 0, 8000, Modulation::Auto,
-             Polarization::Horizontal, 0},
-            {"a.ts terrestrial 177500 7000 # VHF", Delivery::Terrestrial, 177500, 0, 7000,
-             Modulation::Auto, Polarization::Horizontal, 0},
-            {"a.ts cable 346000", Delivery::Cable, 346000, 6900000, 0, Modulation::Qam256,
-             Polarization::Horizontal, 0},
-            {"a.ts cable 346000 6875000 qam64", Delivery::Cable, 346000, 6875000, 0,
-             Modulation::Qam64, Polarization::Horizontal, 0},
-            {"a.ts satellite 11494000 22000000 v", Delivery::Satellite, 11494000, 22000000, 0,
-             Modulation::Qpsk, Polarization::Vertical, 192},
-            {"a.ts satellite 12012000 27500000 L 30.5W", Delivery::Satellite, 12012000, 27500000, 0,
-             Modulation::Qpsk, Polarization::Left, -305},
+    const std::pair<const char*, const char*> cases[] = {
+            {"a.ts terrestrial 586000", "2 586000 0 8000 7 0 0"},
+            {"a.ts terrestrial 177500 7000 # VHF", "2 177500 0 7000 7 0 0"},
+            {"a.ts cable 346000", "1 346000 6900000 0 6 0 0"},
+            {"a.ts cable 346000 6875000 qam64", "1 346000 6875000 0 4 0 0"},
+            {"a.ts satellite 11494000 22000000 v", "0 11494000 22000000 0 0 1 192"},
+            {"a.ts satellite 12012000 27500000 L 30.5W", "0 12012000 27500000 0 0 2 -305"},
     };
-    for (const Case& c : cases) {
+    for (const auto& [text, want] : cases) {
         BroadcastLine line;
         std::string error;
-        ASSERT_TRUE(parseBroadcastLine(c.line, line, error)) << c.line << ": " << error;
-        EXPECT_TRUE(line.tuned);
+        ASSERT_TRUE(parseBroadcastLine(text, line, error)) << text << ": " << error;
         const Tuning& t = line.tuning;
-        EXPECT_EQ(std::make_tuple(t.delivery, t.frequencyKHz, t.symbolRate, t.bandwidthKHz,
-                                  t.modulation, t.polarization, t.orbitalPosition),
-                  std::make_tuple(c.delivery, c.khz, c.rate, c.bandwidth, c.modulation, c.pol,
-                                  c.orbit))
-                << c.line;
+        std::ostringstream got;
+        got << int(t.delivery) << ' ' << t.frequencyKHz << ' ' << t.symbolRate << ' '
+            << t.bandwidthKHz << ' ' << int(t.modulation) << ' ' << int(t.polarization) << ' '
+            << t.orbitalPosition;
+        EXPECT_EQ(got.str(), want) << text;
+        EXPECT_TRUE(line.tuned);
     }
 }
 
