@@ -22,11 +22,11 @@
 // satellite: 10714000 kHz up in 20000 kHz steps, 27500000 symbols/s, horizontal, 19.2E).
 // A frequency is free when no transport of the same delivery system uses it.
 //
-// Time: Broadcast.start is the first capture's first TDT/TOT UTC; else the modification time
-// of its file; else `start`. Broadcast.loopMillis is the longest capture's duration (from its
-// PCR, else its PTS, else its TDT/TOT; at least to its last display set or teletext page).
-// The same transport read from several captures: the capture it is the actual transport of
-// wins over what others tell of it.
+// Time: Broadcast.start is the first TDT/TOT UTC of the first capture (in the order read) that
+// has one; else the modification time of the first capture's file; else `start`.
+// Broadcast.loopMillis is the longest capture's duration (from its PCR, else its PTS, else its
+// TDT/TOT; at least to its last display set or teletext page). The same transport read from
+// several captures: the capture it is the actual transport of wins over what others tell of it.
 #pragma once
 
 #include <cstdint>
