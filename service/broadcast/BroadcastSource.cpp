@@ -114,6 +114,12 @@ void merge(Broadcast& b, std::vector<std::vector<bool>>& tuned,
             if (isActual && !actual[hn][ht]) {
                 const Tuning keep = have->tuning;
                 const bool keepTuned = tuned[hn][ht];
+                // Events that another capture's EIT other gave, where this one has none.
+                for (Service& s : t.services) {
+                    for (Service& was : have->services) {
+                        if (was.id == s.id && s.events.empty()) s.events = std::move(was.events);
+                    }
+                }
                 *have = std::move(t);
                 actual[hn][ht] = true;
                 if (!isTuned && keepTuned) have->tuning = keep;
