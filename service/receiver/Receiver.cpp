@@ -1,11 +1,13 @@
 #include "Receiver.h"
 
+#include "broadcast/BroadcastSource.h"
 #include "broadcast/Builtin.h"
 
 #include <android_runtime/AndroidRuntime.h>
 
 #include <algorithm>
 #include <cmath>
+#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 
@@ -121,8 +123,31 @@ std::shared_ptr<Receiver> Receiver::shared() {
     static auto* rx = [] {
         Clock::Settings settings = Clock::fromEnvironment();
         int64_t start = Clock(settings).nowSeconds();
+        const char* setting = getenv("DVB_BROADCAST");
+        dvbmodel::Broadcast broadcast;
+        if (setting != nullptr && *setting != '\0' && strcmp(setting, "builtin") != 0) {
+            // Captures: what was dropped from them goes to the console, for the user to see;
+            // a setting that cannot be read leaves nothing on the air.
+            std::string error;
+            dvbmodel::TsReadStats stats;
+            if (!dvbmodel::loadBroadcast(setting, start, broadcast, error, &stats)) {
+                fprintf(stderr, "DVB_BROADCAST: %s\n", error.c_str());
+            } else {
+                fprintf(stderr, "DVB_BROADCAST %s: %s\n", setting,
+                        dvbmodel::formatTsReadStats(stats).c_str());
+                // The clock starts at the captures' own time unless DVB_CLOCK_START says
+                // otherwise, so that "now" is the broadcast's now.
+                const char* clockStart = getenv("DVB_CLOCK_START");
+                if (clockStart == nullptr || *clockStart == '\0') {
+                    settings.deterministic = true;
+                    settings.startMillis = broadcast.start * 1000;
+                }
+            }
+        } else {
+            broadcast = defaultBroadcast(start);
+        }
         return new std::shared_ptr<Receiver>(
-                std::make_shared<Receiver>(defaultBroadcast(start), settings));
+                std::make_shared<Receiver>(std::move(broadcast), settings));
     }();
     return *rx;
 }

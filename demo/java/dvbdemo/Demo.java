@@ -12,6 +12,8 @@ import java.time.Instant;
 import java.time.ZoneOffset;
 import java.time.format.DateTimeFormatter;
 import java.util.ArrayList;
+import java.util.HashSet;
+import java.util.Set;
 import java.util.Arrays;
 import java.util.Comparator;
 import java.util.LinkedHashMap;
@@ -124,7 +126,8 @@ public final class Demo {
         }
 
         title("Channel list");
-        channels.sort(Comparator.comparingLong(c -> c.info.lcn));
+        // By logical channel number; services without one last.
+        channels.sort(Comparator.comparingLong(c -> c.info.lcn == 0 ? Long.MAX_VALUE : c.info.lcn));
         for (Channel c : channels) {
             String type = c.info.svcType == 2 ? "radio" : c.info.svcType == 0x19 ? "TV HD" : "TV";
             System.out.printf("%4d  %-30s %-6s %s%s%n", c.info.lcn, c.name, type,
@@ -226,7 +229,7 @@ public final class Demo {
 
     Channel choose(List<Channel> channels) {
         for (Channel c : channels) {
-            if (wantedService == null ? c.info.svcType != 2 && (c.name.contains("Kanal Eins HD") || capture())
+            if (wantedService == null ? c.info.svcType != 2 && (c.name.contains("Kanal Eins HD") || capture() && c.info.lcn != 0)
                     : c.name.equalsIgnoreCase(wantedService) || wantedService.equals("" + c.info.lcn)) {
                 return c;
             }
@@ -252,14 +255,17 @@ public final class Demo {
         return f;
     }
 
-    /** What a played service carries: its first subtitle component and its teletext pages. */
+    /** What a played service carries: its subtitle components and its teletext pages. */
     static final class Components {
-        Strm.SubtitleContent subtitle;
+        final List<Strm.SubtitleContent> subtitles = new ArrayList<>();
         final List<Strm.TeletextContent> teletext = new ArrayList<>();
     }
 
-    /** Opens a stream and starts `c` on the first of its network's transponders that carries it. */
-    long start(Channel c) {
+    /**
+     * Opens a stream and starts `c` on the first of its network's transponders that carries it;
+     * says how it went when `print`.
+     */
+    long start(Channel c, boolean print) {
         Strm strm = dvb.getStrm();
         Strm.STRM_OpenSettings open = new Strm.STRM_OpenSettings();
         open.szPath = "";
@@ -281,7 +287,7 @@ public final class Demo {
             started = strm.Strm_Start(handle, svc, langs, frontEnd(c.scan, t));
             if (started == 0) break;
         }
-        System.out.println("Strm_Start " + c.name + " -> " + started);
+        if (print) System.out.println("Strm_Start -> " + started);
         return handle;
     }
 
@@ -305,7 +311,7 @@ public final class Demo {
         for (int i = 0; i < info.subtitleCount; i++) {
             Strm.SubtitleContent s = new Strm.SubtitleContent();
             strm.Strm_GetSubTilteStreamInfo(i, s);
-            if (found.subtitle == null) found.subtitle = s;
+            found.subtitles.add(s);
             if (print) System.out.printf("  subtitle PID %4d type 0x%02x %s pages %d/%d%n", s.pid, s.type,
                     s.langCode, s.compositionPageId, s.ancillaryPageId);
         }
@@ -322,7 +328,7 @@ public final class Demo {
     Components play(Channel c) throws Exception {
         title("Playing " + c.info.lcn + " " + c.name);
         Strm strm = dvb.getStrm();
-        long handle = start(c);
+        long handle = start(c, true);
         Strm.STRM_GetStatus st = new Strm.STRM_GetStatus();
         for (int i = 0; i < 100 && (st.feStatus & 0x10) == 0; i++) {
             Thread.sleep(20);
@@ -338,7 +344,7 @@ public final class Demo {
 
         events(strm, handle);
         schedule(strm, handle, c);
-        if (found.subtitle != null) subtitles(handle, found.subtitle, capture() ? 20 : 1);
+        if (!found.subtitles.isEmpty()) subtitles(handle, found.subtitles);
         if (!found.teletext.isEmpty()) pages(handle, found.teletext);
         stop(strm, handle);
         return found;
@@ -356,14 +362,14 @@ public final class Demo {
      */
     void others(Channel played, Components shown, List<Channel> channels) throws Exception {
         Strm strm = dvb.getStrm();
-        boolean subtitles = shown.subtitle != null, teletext = !shown.teletext.isEmpty();
+        boolean subtitles = !shown.subtitles.isEmpty(), teletext = !shown.teletext.isEmpty();
         for (Channel c : channels) {
             if (c == played || (subtitles && teletext)) continue;
-            long handle = start(c);
+            long handle = start(c, false);
             Components found = components(strm, handle, false);
-            if (!subtitles && found.subtitle != null) {
+            if (!subtitles && !found.subtitles.isEmpty()) {
                 subtitles = true;
-                subtitles(handle, found.subtitle, 20);
+                subtitles(handle, found.subtitles);
             }
             if (!teletext && !found.teletext.isEmpty()) {
                 teletext = true;
@@ -442,6 +448,18 @@ public final class Demo {
     }
 
     /**
+     * The built-in broadcast: the first display set of the first subtitle component, as
+     * subtitle.png. Captures: the display sets (up to 20) of every component, each as
+     * subtitle-PID-NN.png.
+     */
+    void subtitles(long stream, List<Strm.SubtitleContent> components) throws InterruptedException, IOException {
+        for (Strm.SubtitleContent content : components) {
+            subtitles(stream, content, capture() ? 20 : 1);
+            if (!capture()) break;
+        }
+    }
+
+    /**
      * Writes up to `count` display sets with regions, each composed on the display, as PNGs;
      * gives up when no new one comes within 3 seconds.
      */
@@ -457,6 +475,8 @@ public final class Demo {
         s.ancillaryPageId = content.ancillaryPageId;
         s.hstrm = stream;
         long handle = sub.Subttl_Start(s);
+        // A capture plays in a loop: the first display set seen again ends it.
+        Set<Integer> seen = new HashSet<>();
         for (int written = 0, guard = 0; written < count && guard < 200; guard++) {
             int[] e = await(240, 3);
             if (e == null) break;
@@ -464,14 +484,20 @@ public final class Demo {
             Subttl.SUBTTL_Data_t data = new Subttl.SUBTTL_Data_t();
             sub.Subttl_GetData(handle, data);
             if (data.numRegions == 0) continue;
-            compose(data, new File(out, count == 1 ? "subtitle.png" : String.format("subtitle-%02d.png", ++written)));
+            BufferedImage image = compose(data);
+            int[] argb = image.getRGB(0, 0, image.getWidth(), image.getHeight(), null, 0, image.getWidth());
+            if (!seen.add(Arrays.hashCode(argb))) break;
+            File png = new File(out, count == 1 ? "subtitle.png" : String.format("subtitle-%d-%02d.png", content.pid, ++written));
+            ImageIO.write(image, "png", png);
+            System.out.printf("display set at PTS %d: %d regions, %d CLUTs -> %s%n", data.i_pts & 0xFFFFFFFFL,
+                    data.numRegions, data.numCluts, png);
             if (count == 1) break;
         }
         sub.Subttl_Stop(handle);
     }
 
-    /** The display set just read, its regions placed on the display in their CLUTs' colours, as a PNG. */
-    void compose(Subttl.SUBTTL_Data_t data, File png) throws IOException {
+    /** The display set just read, its regions placed on the display in their CLUTs' colours. */
+    BufferedImage compose(Subttl.SUBTTL_Data_t data) {
         Subttl sub = dvb.getSubttl();
         Subttl.SUBTTL_Display display = new Subttl.SUBTTL_Display();
         sub.Subttl_GetDisplayData(display);
@@ -507,9 +533,7 @@ public final class Demo {
                 }
             }
         }
-        ImageIO.write(image, "png", png);
-        System.out.printf("display set at PTS %d: %d regions, %d CLUTs, page %d -> %s%n",
-                data.i_pts & 0xFFFFFFFFL, data.numRegions, data.numCluts, pg.i_id, png);
+        return image;
     }
 
     /** The 2-by-3 cells of a block mosaic character (bit 0 top left ... bit 5 bottom right), or -1. */
