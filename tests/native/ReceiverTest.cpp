@@ -412,6 +412,7 @@ TEST_F(ReceiverTest, BadInputGetsItsResult) {
     STRM_GetStatus st{};
     SCNM_GetStatus sst{};
     SCNM_ServiceInfo* list = nullptr;
+    SCNMNET_FrontEndSettings* nets = nullptr;
     uint8_t buf[8];
     int32_t nav[4];
     uint32_t t;
@@ -429,6 +430,8 @@ TEST_F(ReceiverTest, BadInputGetsItsResult) {
             {"scan used after close", [&] { return scnm->GetStatus(scan, &sst); }, kErrBadHandle},
             {"scan list after close", [&] { return scnm->CreateServiceList(scan, &list); },
              kErrBadHandle},
+            {"networks after close", [&] { return scnm->CreateNetworkList(scan, &nets); },
+             kErrBadHandle},
             {"unknown stream", [&] { return strm->GetStatus(12345, &st); }, kErrBadHandle},
             {"stream on no front end", [&] { return strm->Open(&badOpen); }, kErrBadParameter},
             {"time of no stream", [&] { return strm->GetTime(-7, &t); }, kErrBadHandle},
@@ -445,7 +448,7 @@ TEST_F(ReceiverTest, BadInputGetsItsResult) {
     };
     for (const auto& c : cases) EXPECT_EQ(c.op(), c.result) << c.what;
     EXPECT_EQ(sst.result, kErrBadHandle);
-    EXPECT_EQ(list, nullptr);
+    EXPECT_TRUE(list == nullptr && nets == nullptr);
 }
 
 TEST_F(ReceiverTest, SystemInitOpensTheDatabaseFromTheServiceThreadOrSaysWhyNot) {
