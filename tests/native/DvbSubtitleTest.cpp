@@ -128,19 +128,11 @@ DisplaySet sample() {
     auto next = [&seed](uint32_t n) { return ((seed = seed * 1103515245u + 12345u) >> 16) % n; };
     const uint16_t sizes[3][2] = {{97, 5}, {640, 7}, {400, 4}};
     for (uint8_t d = 1; d <= 3; ++d) {
-        Region r{d,
-                 uint8_t(d + 2),
-                 sizes[d - 1][0],
-                 sizes[d - 1][1],
-                 d,
-                 d,
-                 uint8_t(d % 2),
-                 true,
-                 200,
-                 9,
-                 2,
-                 {},
-                 {ObjectRef{uint16_t(40 + d), 0, 0, 0, 0, 0, {}}}};
+        Region r;
+        r.id = r.levelOfCompatibility = r.depth = d, r.version = uint8_t(d + 2);
+        r.width = sizes[d - 1][0], r.height = sizes[d - 1][1], r.clutId = d % 2, r.fill = true;
+        r.background8 = 200, r.background4 = 9, r.background2 = 2;
+        r.objects = {ObjectRef{uint16_t(40 + d), 0, 0, 0, 0, 0, {}}};
         uint32_t codes = 1u << (2 << (d - 1));
         while (r.pixels.size() < size_t{r.width} * r.height) {
             uint32_t length = 1 + next(next(4) == 0 ? 300 : 12);

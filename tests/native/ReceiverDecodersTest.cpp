@@ -46,14 +46,11 @@ protected:
         STRM_OpenSettings open{};
         stream = strm->Open(&open);
         STRM_Settings s{};
-        s.fe.type = kTerrestrial;
-        s.fe.frequency = 506000;
-        s.svcId = 0x0311;
+        s.fe.type = kTerrestrial, s.fe.frequency = 506000, s.svcId = 0x0311;
         EXPECT_EQ(strm->Start(stream, &s), kOk);
         advance(1000);
         SUBTTL_Settings sub{};
-        sub.pid = 0x105;
-        sub.compositionPageId = sub.ancillaryPageId = 1;
+        sub.pid = 0x105, sub.compositionPageId = sub.ancillaryPageId = 1;
         sub.hstrm = static_cast<uint32_t>(stream);
         subHandle = subttl->Start(&sub);
         TELTXT_Settings txt{};
@@ -134,12 +131,8 @@ TEST_F(DecodersTest, SubtitleBufferHoldsTheModelsDisplaySetWithTheStreamsPts) {
 TEST(SubtitleData, StaysWithinTheBuffersRoom) {
     dvbmodel::DisplaySet set;
     dvbmodel::Region big;
-    big.width = 700, big.height = 600;
-    big.pixels.assign(700 * 600, 5);
-    big.objects.resize(20);
-    set.regions.assign(7, big);
-    set.placements.resize(20);
-    set.cluts.resize(6);
+    big.width = 700, big.height = 600, big.pixels.assign(700 * 600, 5), big.objects.resize(20);
+    set.regions.assign(7, big), set.placements.resize(20), set.cluts.resize(6);
     std::vector<uint8_t> bytes(sizeof(SUBTTL_Data) + 64, 0xAA);
     auto* data = reinterpret_cast<SUBTTL_Data*>(bytes.data());
     fillSubtitleData(set, 7, data);
@@ -164,10 +157,8 @@ TEST(SubtitleData, DefaultClutHasTheStandardsColours) {
             {c.c_8b[0x10], {60, 203, 103, 0}}, {c.c_8b[0x4C], {41, 110, 240, 128}},
             {c.c_8b[0x88], {16, 128, 128, 0}}, {c.c_8b[0xD6], {181, 141, 159, 0}},
     };
-    for (const auto& k : cases) {
-        EXPECT_EQ((std::array<int, 4>{k.entry.y, k.entry.cr, k.entry.cb, k.entry.t}), k.ycrcbt)
-                << &k - cases;
-    }
+    for (const auto& k : cases)
+        EXPECT_EQ((std::array<int, 4>{k.entry.y, k.entry.cr, k.entry.cb, k.entry.t}), k.ycrcbt);
 }
 
 TEST_F(DecodersTest, NewDisplaySetsAndPageSendingsRaiseTheirEvents) {

@@ -56,9 +56,11 @@ ANT_FrontendParameters terrestrial(int32_t khz, int32_t bandwidth = 8000) {
     return p;
 }
 
-template <typename F>
-ANT_FrontendParameters with(ANT_FrontendParameters p, F change) {
-    change(p);
+using P = ANT_FrontendParameters;
+
+template <typename T, typename V>
+P with(P p, T P::*field, V value) {
+    p.*field = static_cast<T>(value);
     return p;
 }
 
@@ -95,20 +97,16 @@ protected:
         rx->clock().advance(ms);
         rx->sync();
     }
-    std::vector<std::array<int, 3>> take(int msg) {
+    Events take(int msg) {
         std::lock_guard<std::mutex> lock(eventLock);
-        std::vector<std::array<int, 3>> out;
-        for (const auto& e : events) {
-            if (e[0] == msg) out.push_back(e);
-        }
-        events.erase(std::remove_if(events.begin(), events.end(),
-                                    [msg](const auto& e) { return e[0] == msg; }),
-                     events.end());
+        auto taken = std::stable_partition(events.begin(), events.end(),
+                                           [msg](const auto& e) { return e[0] != msg; });
+        Events out(taken, events.end());
+        events.erase(taken, events.end());
         return out;
     }
-    int32_t startStream(int32_t fe, const ANT_FrontendParameters& p, uint16_t svc, int32_t* h) {
+    int32_t startStream(const P& p, uint16_t svc, int32_t* h) {
         STRM_OpenSettings open{};
-        open.frontend = fe;
         *h = strm->Open(&open);
         STRM_Settings s{};
         s.fe = p;
@@ -117,9 +115,14 @@ protected:
         s.audioPid = static_cast<uint16_t>(svc == 28006 ? 0x202 : 0);
         return strm->Start(*h, &s);
     }
+    ANT_Status status() {
+        ANT_Status st{};
+        cfg->GetStatus(0, &st);
+        return st;
+    }
 
     std::mutex eventLock;
-    std::vector<std::array<int, 3>> events;
+    Events events;
     std::shared_ptr<Receiver> rx;
     android::sp<ReceiverCfg> cfg;
     android::sp<ReceiverScnm> scnm;
@@ -138,22 +141,16 @@ TEST_F(ReceiverTest, TuneLocksOnlyWhereTheModelHasATransponder) {
             {"3.25 MHz off", sat(11497000, 0), kErrNoSignal},
             {"other polarisation", sat(11493750, 1), kErrNoSignal},
             {"left circular is 18 V", sat(11493750, 2), kOk},
-            {"high band, tone on", with(sat(12551500, 1), [](auto& p) { p.tone = kToneOn; }), kOk},
-            {"high band, tone off", with(sat(12551500, 1), [](auto& p) { p.tone = kToneOff; }),
-             kErrNoSignal},
-            {"low band, tone on", with(sat(11493750, 0), [](auto& p) { p.tone = kToneOn; }),
-             kErrNoSignal},
+            {"high band, tone on", with(sat(12551500, 1), &P::tone, kToneOn), kOk},
+            {"high band, tone off", with(sat(12551500, 1), &P::tone, kToneOff), kErrNoSignal},
+            {"low band, tone on", with(sat(11493750, 0), &P::tone, kToneOn), kErrNoSignal},
             {"dish at 13.0E", sat(11493750, 0, 130), kErrNoSignal},
-            {"13.0E transponder",
-             with(sat(11766000, 0, 130), [](auto& p) { p.symbolRate = 27500000; }), kOk},
-            {"LNB unpowered", with(sat(11493750, 0), [](auto& p) { p.lnbpower = 0; }),
-             kErrNoSignal},
-            {"symbol rate", with(sat(11493750, 0), [](auto& p) { p.symbolRate = 27500000; }),
-             kErrNoSignal},
-            {"modulation QPSK on 8PSK", with(sat(11493750, 0), [](auto& p) { p.modulation = 0; }),
-             kErrNoSignal},
-            {"FEC 2/3", with(sat(11493750, 0), [](auto& p) { p.fecInner = 1; }), kOk},
-            {"FEC 3/4", with(sat(11493750, 0), [](auto& p) { p.fecInner = 2; }), kErrNoSignal},
+            {"13.0E transponder", with(sat(11766000, 0, 130), &P::symbolRate, 27500000), kOk},
+            {"LNB unpowered", with(sat(11493750, 0), &P::lnbpower, 0), kErrNoSignal},
+            {"symbol rate", with(sat(11493750, 0), &P::symbolRate, 27500000), kErrNoSignal},
+            {"modulation QPSK on 8PSK", with(sat(11493750, 0), &P::modulation, 0), kErrNoSignal},
+            {"FEC 2/3", with(sat(11493750, 0), &P::fecInner, 1), kOk},
+            {"FEC 3/4", with(sat(11493750, 0), &P::fecInner, 2), kErrNoSignal},
             {"cable", cable(346000), kOk},
             {"cable 150 kHz off", cable(346150), kOk},
             {"cable 300 kHz off", cable(346300), kErrNoSignal},
@@ -162,7 +159,7 @@ TEST_F(ReceiverTest, TuneLocksOnlyWhereTheModelHasATransponder) {
             {"terrestrial, any bandwidth", terrestrial(650000, 0), kOk},
             {"terrestrial 7 MHz", terrestrial(586000, 7000), kErrNoSignal},
             {"terrestrial 200 kHz off", terrestrial(586200), kErrNoSignal},
-            {"unknown type", with(cable(346000), [](auto& p) { p.type = 5; }), kErrBadParameter},
+            {"unknown type", with(cable(346000), &P::type, 5), kErrBadParameter},
             {"frequency out of band", sat(100, 0), kErrBadParameter},
             {"negative frequency", terrestrial(-586000), kErrBadParameter},
     };
@@ -174,52 +171,40 @@ TEST_F(ReceiverTest, TuneLocksOnlyWhereTheModelHasATransponder) {
 }
 
 TEST_F(ReceiverTest, LockIsAcquiredLostAndRegained) {
-    ANT_FrontendParameters good = sat(11493750, 0), bad = sat(11493750, 1);
-    ANT_Status st{};
+    P good = sat(11493750, 0), bad = sat(11493750, 1);
     ASSERT_EQ(cfg->Tune(0, &good), kOk);
-    cfg->GetStatus(0, &st);
-    EXPECT_EQ(st.feStatus, kFeSignal | kFeCarrier);
-    EXPECT_EQ(st.quality, 0);
+    EXPECT_EQ(std::make_tuple(status().feStatus, status().quality),
+              std::make_tuple(kFeSignal | kFeCarrier, 0));
     advance(200);
-    cfg->GetStatus(0, &st);
-    EXPECT_EQ(st.feStatus, kFeSignal | kFeCarrier | kFeViterbi);
+    EXPECT_EQ(status().feStatus, kFeSignal | kFeCarrier | kFeViterbi);
     advance(200);
-    cfg->GetStatus(0, &st);
+    ANT_Status st = status();
     EXPECT_EQ(st.feStatus, 0x1F);
-    EXPECT_GE(st.strength, 40);
-    EXPECT_LE(st.strength, 90);
-    EXPECT_GT(st.quality, 30);
+    EXPECT_TRUE(st.strength >= 40 && st.strength <= 90 && st.quality > 30) << st.strength;
     EXPECT_EQ(st.extStatus, st.quality * 3 / 2);
 
     ASSERT_EQ(cfg->Tune(0, &bad), kOk);
     advance(999);
-    cfg->GetStatus(0, &st);
-    EXPECT_EQ(st.feStatus, 0);
+    EXPECT_EQ(status().feStatus, 0);
     advance(1);
-    cfg->GetStatus(0, &st);
-    EXPECT_EQ(st.feStatus, kFeTimedOut);
+    EXPECT_EQ(status().feStatus, kFeTimedOut);
     ASSERT_EQ(cfg->Tune(0, &good), kOk);
     advance(400);
     // The same tuning again keeps the lock.
     ASSERT_EQ(cfg->Tune(0, &good), kOk);
     advance(100);
-    using E = std::vector<std::array<int, 3>>;
-    EXPECT_EQ(take(kEvtLock), (E{{kEvtLock, 0, 1}, {kEvtLock, 0, 0}, {kEvtLock, 0, 1}}));
+    EXPECT_EQ(take(kEvtLock), (Events{{kEvtLock, 0, 1}, {kEvtLock, 0, 0}, {kEvtLock, 0, 1}}));
 
     // A receiver with the same seed and clock reports the same signal.
     Receiver twin(fallbackBroadcast(kStart / 1000), {true, rx->clock().nowMillis(), 0.0, 7},
                   [](int, int, int) {});
     Signal a = rx->signal(good, 0, rx->clock().nowMillis());
     Signal b = twin.signal(good, 0, twin.clock().nowMillis());
-    EXPECT_EQ(a.strength, b.strength);
-    EXPECT_EQ(a.quality, b.quality);
+    EXPECT_EQ(std::tie(a.strength, a.quality), std::tie(b.strength, b.quality));
 }
 
 TEST_F(ReceiverTest, PositionerMovesAtMotorSpeedWithinItsLimits) {
-    ANT_FrontendParameters usals = with(sat(11493750, 0), [](auto& p) {
-        p.diseqctype = kUsals;
-        p.myLatitude = 515;
-    });
+    P usals = with(with(sat(11493750, 0), &P::diseqctype, kUsals), &P::myLatitude, 515);
     double angle = usalsAngle(19.2, {0.0, 51.5});
     EXPECT_NEAR(angle, 21.15, 0.01);
     int64_t travel = std::llround(angle / kMotorDegreesPerSecond * 1000);
@@ -230,9 +215,7 @@ TEST_F(ReceiverTest, PositionerMovesAtMotorSpeedWithinItsLimits) {
     EXPECT_EQ(cfg->TryTune(0, &usals), kErrNoSignal);
     advance(300);
     EXPECT_EQ(cfg->TryTune(0, &usals), kOk);
-    EXPECT_EQ(take(kEvtPositioner),
-              (std::vector<std::array<int, 3>>{
-                      {kEvtPositioner, 0, static_cast<int>(std::lround(angle * 10))}}));
+    EXPECT_EQ(take(kEvtPositioner), (Events{{kEvtPositioner, 0, int(std::lround(angle * 10))}}));
 
     // Each step: the operation, its result, then how long the motor runs and where it stops.
     const struct {
@@ -274,19 +257,17 @@ TEST_F(ReceiverTest, PositionerMovesAtMotorSpeedWithinItsLimits) {
     }
 }
 
-struct ScanCase {
-    const char* what;
-    int32_t type;
-    ANT_FrontendParameters fe;
-    std::set<int> services;
-    size_t transponders;
-    int64_t millis;
-};
-
 TEST_F(ReceiverTest, EachKindOfScanFindsItsServicesInItsTime) {
-    const ScanCase cases[] = {
+    const struct {
+        const char* what;
+        int32_t type;
+        P fe;
+        std::set<int> services;
+        size_t transponders;
+        int64_t millis;
+    } cases[] = {
             {"one transponder", kScanSingle, sat(12551500, 1), {28006, 28007, 28008}, 1, 1900},
-            {"the NIT's network",
+            {"network",
              kScanNetwork,
              sat(11493750, 0),
              {10301, 10302, 28006, 28007, 28008},
@@ -298,31 +279,28 @@ TEST_F(ReceiverTest, EachKindOfScanFindsItsServicesInItsTime) {
             {"satellite at 13.0E", kScanFullBand, sat(0, 0, 130), {5001, 5002}, 1, 13900},
     };
     for (const auto& c : cases) {
+        SCOPED_TRACE(c.what);
         SCNM_OpenSettings open{0, 0};
         int32_t h = scnm->Open(&open);
         ASSERT_GT(h, 0);
         SCNM_StartSettings start{};
         start.fe = c.fe;
         start.scanType = c.type;
-        ASSERT_EQ(scnm->Start(h, &start), kOk) << c.what;
+        ASSERT_EQ(scnm->Start(h, &start), kOk);
         advance(c.millis - 1);
         SCNM_GetStatus st{};
         scnm->GetStatus(h, &st);
-        EXPECT_EQ(st.result, kScanRunning) << c.what;
-        EXPECT_LT(st.sfStatus, 100) << c.what;
-        EXPECT_TRUE(take(kEvtScanComplete).empty()) << c.what;
+        EXPECT_EQ(st.result, kScanRunning);
+        EXPECT_LT(st.sfStatus, 100);
+        EXPECT_EQ(take(kEvtScanComplete), Events{});
         advance(1);
         scnm->GetStatus(h, &st);
-        EXPECT_EQ(st.result, kScanDone) << c.what;
-        EXPECT_EQ(st.sfStatus, 100) << c.what;
+        EXPECT_EQ(std::make_tuple(st.result, st.sfStatus), std::make_tuple(kScanDone, 100));
         auto progress = take(kEvtScanProgress);
         ASSERT_FALSE(progress.empty());
-        EXPECT_EQ(progress.back(), (std::array<int, 3>{kEvtScanProgress, h, 100})) << c.what;
-        EXPECT_TRUE(std::is_sorted(progress.begin(), progress.end())) << c.what;
-        EXPECT_EQ(take(kEvtScanComplete),
-                  (std::vector<std::array<int, 3>>{
-                          {kEvtScanComplete, h, static_cast<int>(c.services.size())}}))
-                << c.what;
+        EXPECT_EQ(progress.back(), (std::array<int, 3>{kEvtScanProgress, h, 100}));
+        EXPECT_TRUE(std::is_sorted(progress.begin(), progress.end()));
+        EXPECT_EQ(take(kEvtScanComplete), (Events{{kEvtScanComplete, h, int(c.services.size())}}));
 
         SCNM_ServiceInfo* svc = nullptr;
         EXPECT_EQ(scnm->CreateServiceList(h, &svc), static_cast<int32_t>(c.services.size()));
@@ -331,15 +309,15 @@ TEST_F(ReceiverTest, EachKindOfScanFindsItsServicesInItsTime) {
             found.insert(svc->svcId);
             EXPECT_NE(svc->svcName[0], 0);
         }
-        EXPECT_EQ(found, c.services) << c.what;
+        EXPECT_EQ(found, c.services);
         SCNMNET_FrontEndSettings* net = nullptr;
         size_t nets = 0;
         scnm->CreateNetworkList(h, &net);
         for (; net != nullptr; net = const_cast<SCNMNET_FrontEndSettings*>(dvbListNext(net))) {
-            EXPECT_EQ(net->type, c.fe.type) << c.what;
+            EXPECT_EQ(net->type, c.fe.type);
             ++nets;
         }
-        EXPECT_EQ(nets, c.transponders) << c.what;
+        EXPECT_EQ(nets, c.transponders);
         EXPECT_EQ(scnm->Close(h), kOk);
     }
 }
@@ -357,27 +335,24 @@ TEST_F(ReceiverTest, AStoppedScanKeepsWhatItFound) {
     advance(5000);
     SCNM_GetStatus st{};
     scnm->GetStatus(h, &st);
-    EXPECT_EQ(st.result, kScanStopped);
-    EXPECT_EQ(st.sfStatus, 50);
     SCNM_ServiceInfo* svc = nullptr;
-    EXPECT_EQ(scnm->CreateServiceList(h, &svc), 2);
-    EXPECT_EQ(take(kEvtScanComplete).size(), 0u);
+    EXPECT_EQ(std::make_tuple(st.result, st.sfStatus, scnm->CreateServiceList(h, &svc)),
+              std::make_tuple(kScanStopped, 50, 2));
+    EXPECT_EQ(take(kEvtScanComplete), Events{});
 }
 
 TEST_F(ReceiverTest, AStreamPlaysWhatTheTransponderCarries) {
     int32_t h;
-    EXPECT_EQ(startStream(0, sat(12551500, 1), 10301, &h), kErrNoService);
-    EXPECT_EQ(startStream(0, sat(12600000, 1), 28006, &h), kErrNoSignal);
-    ASSERT_EQ(startStream(0, sat(12551500, 1), 28006, &h), kOk);
+    EXPECT_EQ(startStream(sat(12551500, 1), 10301, &h), kErrNoService);
+    EXPECT_EQ(startStream(sat(12600000, 1), 28006, &h), kErrNoSignal);
+    ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
     STRM_GetStatus st{};
     strm->GetStatus(h, &st);
     EXPECT_EQ(st.pictureStatus, kNoPicture);
     advance(400);
     strm->GetStatus(h, &st);
-    EXPECT_EQ(st.feStatus, 0x1F);
-    EXPECT_EQ(st.pictureStatus, kDecoding);
-    EXPECT_EQ(st.fpsInteger, 25);
-    EXPECT_EQ(st.fpsDecimal, 0);
+    EXPECT_EQ(std::make_tuple(st.feStatus, st.pictureStatus, st.fpsInteger, st.fpsDecimal),
+              std::make_tuple(0x1F, kDecoding, 25, 0));
     // Presented frames: the last video frame (40 ms) and audio frame (24 ms) begun by now.
     EXPECT_LT(static_cast<uint32_t>(st.localPts - st.videoPts), 3600u);
     EXPECT_LT(static_cast<uint32_t>(st.localPts - st.audioPts), 2160u);
@@ -388,66 +363,56 @@ TEST_F(ReceiverTest, AStreamPlaysWhatTheTransponderCarries) {
 
     STRM_StreamInfo info{};
     ASSERT_EQ(strm->CreatStreamInfo(h, &info), kOk);
-    EXPECT_EQ(info.videoCount, 1);
-    EXPECT_EQ(info.video[0].pid, 0x201);
-    EXPECT_EQ(info.audioCount, 3);
+    EXPECT_EQ(std::vector<int>({info.videoCount, info.video[0].pid, info.audioCount,
+                                info.audio[0].isDolbyAC3, info.audio[1].isDolbyAC3,
+                                info.audio[2].isDolbyAC3, info.subtitleCount,
+                                info.subtitle[0].compositionPageId, info.teletextCount,
+                                info.teletext[1].type, info.pcrPid}),
+              std::vector<int>({1, 0x201, 3, 0, 0, 1, 1, 1, 2, 2, 0x201}));
     EXPECT_STREQ(info.audio[1].langCode0, "eng");
-    EXPECT_EQ(info.audio[0].isDolbyAC3 + info.audio[1].isDolbyAC3, 0);
-    EXPECT_EQ(info.audio[2].isDolbyAC3, 1);
-    EXPECT_EQ(info.subtitleCount, 1);
-    EXPECT_EQ(info.subtitle[0].compositionPageId, 1);
-    EXPECT_EQ(info.teletextCount, 2);
-    EXPECT_EQ(info.teletext[1].type, 2);
-    EXPECT_EQ(info.pcrPid, 0x201);
 
     EpgEvent present{}, following{};
     ExtEpgEvent presentExt{}, followingExt{};
     ASSERT_EQ(strm->GetAllEvent(h, &present, &following, &presentExt, &followingExt), kOk);
     int64_t now = rx->clock().nowSeconds();
-    EXPECT_LE(present.startTime, now);
-    EXPECT_GT(present.startTime + present.duration, now);
-    EXPECT_EQ(following.startTime, present.startTime + present.duration);
-    EXPECT_EQ(present.runStatus, 4);
-    EXPECT_EQ(following.runStatus, 1);
-    EXPECT_EQ(presentExt.itemCount + followingExt.itemCount, 2u);  // every other event has items
+    const int64_t end = present.startTime + present.duration;
+    EXPECT_TRUE(present.startTime <= now && end > now) << present.startTime;
+    // Every other event has items.
+    EXPECT_EQ(std::make_tuple(int64_t{following.startTime}, present.runStatus, following.runStatus,
+                              presentExt.itemCount + followingExt.itemCount),
+              std::make_tuple(end, 4, 1, 2u));
     uint32_t t = 0;
     EXPECT_EQ(strm->GetTime(h, &t), kOk);
     EXPECT_EQ(t, static_cast<uint32_t>(now));
-    EXPECT_EQ(take(kEvtPresent),
-              (std::vector<std::array<int, 3>>{{kEvtPresent, h, present.evtId}}));
-    advance((present.startTime + present.duration - now) * 1000);
-    EXPECT_EQ(take(kEvtPresent),
-              (std::vector<std::array<int, 3>>{{kEvtPresent, h, following.evtId}}));
+    EXPECT_EQ(take(kEvtPresent), (Events{{kEvtPresent, h, present.evtId}}));
+    advance((end - now) * 1000);
+    EXPECT_EQ(take(kEvtPresent), (Events{{kEvtPresent, h, following.evtId}}));
 
     // Time shift: recording from now, paused 5 s into it.
     STRM_Settings s{};
     strm->GetSettings(h, &s);
     EXPECT_EQ(s.svcId, 28006);
-    s.playSpeed = 0;
-    s.playSpeedDiv = 1;
-    s.posTime = 5;
+    s.playSpeed = 0, s.playSpeedDiv = 1, s.posTime = 5;
     ASSERT_EQ(strm->SetSettings(h, &s), kOk);
     advance(10000);
     s.posTime = 5;
     ASSERT_EQ(strm->SetSettings(h, &s), kOk);
     advance(10000);
     strm->GetStatus(h, &st);
-    EXPECT_EQ(st.recstate, kPvrActive);
-    EXPECT_EQ(st.recduration, 20);
-    EXPECT_EQ(st.recsize, 10000000);
-    EXPECT_EQ(st.pbstate, kPvrPaused);
-    EXPECT_EQ(st.pbposition, 5);
+    EXPECT_EQ(std::make_tuple(st.recstate, st.recduration, st.recsize, st.pbstate, st.pbposition),
+              std::make_tuple(kPvrActive, 20, 10000000, kPvrPaused, 5));
 }
 
 TEST_F(ReceiverTest, BadInputGetsItsResult) {
     int32_t h;
-    ASSERT_EQ(startStream(0, sat(12551500, 1), 28006, &h), kOk);
+    ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
     SCNM_OpenSettings scanOpen{0, 0};
     int32_t scan = scnm->Open(&scanOpen);
     ASSERT_EQ(scnm->Close(scan), kOk);
     STRM_GetStatus st{};
     SCNM_GetStatus sst{};
     SCNM_ServiceInfo* list = nullptr;
+    SCNMNET_FrontEndSettings* nets = nullptr;
     uint8_t buf[8];
     int32_t nav[4];
     uint32_t t;
@@ -465,6 +430,8 @@ TEST_F(ReceiverTest, BadInputGetsItsResult) {
             {"scan used after close", [&] { return scnm->GetStatus(scan, &sst); }, kErrBadHandle},
             {"scan list after close", [&] { return scnm->CreateServiceList(scan, &list); },
              kErrBadHandle},
+            {"networks after close", [&] { return scnm->CreateNetworkList(scan, &nets); },
+             kErrBadHandle},
             {"unknown stream", [&] { return strm->GetStatus(12345, &st); }, kErrBadHandle},
             {"stream on no front end", [&] { return strm->Open(&badOpen); }, kErrBadParameter},
             {"time of no stream", [&] { return strm->GetTime(-7, &t); }, kErrBadHandle},
@@ -481,7 +448,7 @@ TEST_F(ReceiverTest, BadInputGetsItsResult) {
     };
     for (const auto& c : cases) EXPECT_EQ(c.op(), c.result) << c.what;
     EXPECT_EQ(sst.result, kErrBadHandle);
-    EXPECT_EQ(list, nullptr);
+    EXPECT_TRUE(list == nullptr && nets == nullptr);
 }
 
 TEST_F(ReceiverTest, SystemInitOpensTheDatabaseFromTheServiceThreadOrSaysWhyNot) {
