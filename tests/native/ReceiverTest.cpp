@@ -434,7 +434,6 @@ TEST_F(ReceiverTest, AStreamPlaysWhatTheTransponderCarries) {
     strm->GetStatus(h, &st);
     EXPECT_EQ(st.recstate, kPvrActive);
     EXPECT_EQ(st.recduration, 20);
-    EXPECT_EQ(st.recsize, 10000000);
     EXPECT_EQ(st.pbstate, kPvrPaused);
     EXPECT_EQ(st.pbposition, 5);
 }
