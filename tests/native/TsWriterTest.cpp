@@ -4,6 +4,17 @@
 #include <broadcast/TsWriter.h>
 #include <gtest/gtest.h>
 #include <receiver/Modules.h>
+// clang-format off
+#include <dvbpsi/dvbpsi.h>
+#include <dvbpsi/psi.h>
+#include <dvbpsi/descriptor.h>
+#include <dvbpsi/demux.h>
+#include <dvbpsi/eit.h>
+#include <dvbpsi/nit.h>
+#include <dvbpsi/tot.h>
+#include <dvbpsi/dr_4d.h>
+#include <dvbpsi/dr_83.h>
+// clang-format on
 
 #include <unistd.h>
 #include <algorithm>
@@ -105,6 +116,107 @@ TEST(TsWriter, EveryTransportOfTheBuiltinBroadcastReadsBackInFfprobe) {
             EXPECT_EQ(state.stats().sectionsDropped, 0u);
         }
     }
+}
+
+// The EIT, NIT and TDT of a written stream as libdvbpsi's decoders read them.
+struct Tables {
+    std::vector<dvbpsi_eit_t*> eit;
+    std::vector<dvbpsi_nit_t*> nit;
+    std::vector<dvbpsi_tot_t*> tdt;
+    ~Tables() {
+        for (auto* t : eit) dvbpsi_eit_delete(t);
+        for (auto* t : nit) dvbpsi_nit_delete(t);
+        for (auto* t : tdt) dvbpsi_tot_delete(t);
+    }
+    void read(const std::vector<uint8_t>& ts) {
+        for (uint16_t pid : {0x10, 0x12, 0x14}) {
+            dvbpsi_t* h = dvbpsi_new(nullptr, DVBPSI_MSG_NONE);
+            dvbpsi_AttachDemux(h, attach, this);
+            for (size_t i = 0; i + 188 <= ts.size(); i += 188) {
+                if (((ts[i + 1] & 0x1F) << 8 | ts[i + 2]) == pid)
+                    dvbpsi_packet_push(h, const_cast<uint8_t*>(&ts[i]));
+            }
+            dvbpsi_DetachDemux(h);
+            dvbpsi_delete(h);
+        }
+    }
+    static void attach(dvbpsi_t* h, uint8_t table, uint16_t ext, void* self) {
+        auto* t = static_cast<Tables*>(self);
+        if (table == 0x4E)
+            dvbpsi_eit_attach(
+                    h, table, ext,
+                    [](void* d, dvbpsi_eit_t* e) { static_cast<Tables*>(d)->eit.push_back(e); }, t);
+        if (table == 0x40)
+            dvbpsi_nit_attach(
+                    h, table, ext,
+                    [](void* d, dvbpsi_nit_t* n) { static_cast<Tables*>(d)->nit.push_back(n); }, t);
+        if (table == 0x70)
+            dvbpsi_tot_attach(
+                    h, table, ext,
+                    [](void* d, dvbpsi_tot_t* n) { static_cast<Tables*>(d)->tdt.push_back(n); }, t);
+    }
+};
+
+// EN 300 468 annex C read back: modified Julian date and BCD hours, minutes, seconds.
+int64_t utcSeconds(uint64_t t) {
+    auto bcd = [](uint64_t v) { return int64_t(v >> 4 & 15) * 10 + int64_t(v & 15); };
+    return (int64_t(t >> 24) - 40587) * 86400 + bcd(t >> 16) * 3600 + bcd(t >> 8) * 60 + bcd(t);
+}
+
+TEST(TsWriter, EventsLogicalChannelsAndTimeReadBackInLibdvbpsi) {
+    Broadcast b = builtinBroadcast(kStart / 1000);
+    const Network& net = b.networks[0];
+    const Transport& tp = net.transports[0];
+    int64_t from = kStart + 7 * 3600 * 1000;
+    std::vector<uint8_t> ts;
+    TsWriterState state;
+    writeTransport(b, net, tp, from, 2500, ts, state);
+    Tables tables;
+    tables.read(ts);
+    ASSERT_FALSE(tables.tdt.empty());
+    for (const auto* t : tables.tdt) {
+        EXPECT_GE(utcSeconds(t->i_utc_time), from / 1000);
+        EXPECT_LT(utcSeconds(t->i_utc_time), (from + 2500) / 1000);
+    }
+    for (const auto& s : tp.services) {
+        auto eit = std::find_if(tables.eit.begin(), tables.eit.end(),
+                                [&](auto* e) { return e->i_extension == s.id; });
+        ASSERT_NE(eit, tables.eit.end()) << s.id;
+        const Event* want[2] = {nullptr, nullptr};
+        for (const auto& e : s.events) {
+            if (e.start <= from / 1000 && from / 1000 < e.start + e.duration) want[0] = &e;
+            if (e.start > from / 1000 && want[1] == nullptr) want[1] = &e;
+        }
+        const dvbpsi_eit_event_t* got = (*eit)->p_first_event;
+        for (int i = 0; i < 2; ++i, got = got->p_next) {
+            ASSERT_TRUE(got != nullptr && want[i] != nullptr) << s.id;
+            EXPECT_EQ(got->i_event_id, want[i]->id);
+            EXPECT_EQ(utcSeconds(got->i_start_time), want[i]->start);
+            EXPECT_EQ(utcSeconds(uint64_t{40587} << 24 | got->i_duration), want[i]->duration);
+            EXPECT_EQ(got->i_running_status, i == 0 ? 4 : 1);
+            dvbpsi_short_event_dr_t* name = dvbpsi_DecodeShortEventDr(got->p_first_descriptor);
+            ASSERT_NE(name, nullptr);
+            EXPECT_EQ(std::string(reinterpret_cast<char*>(name->i_event_name),
+                                  name->i_event_name_length),
+                      want[i]->name);
+        }
+    }
+    ASSERT_FALSE(tables.nit.empty());
+    std::set<std::array<int, 3>> lcns, model;
+    for (const auto* ts = tables.nit[0]->p_first_ts; ts != nullptr; ts = ts->p_next) {
+        for (auto* d = ts->p_first_descriptor; d != nullptr; d = d->p_next) {
+            auto* lcn = d->i_tag == 0x83 ? dvbpsi_DecodeLCNDr(d) : nullptr;
+            for (int i = 0; lcn != nullptr && i < lcn->i_number_of_entries; ++i)
+                lcns.insert({ts->i_ts_id, lcn->p_entries[i].i_service_id,
+                             lcn->p_entries[i].i_logical_channel_number});
+        }
+    }
+    for (const auto& t : net.transports) {
+        for (const auto& s : t.services) {
+            if (s.lcn != 0) model.insert({t.tsid, s.id, s.lcn});
+        }
+    }
+    EXPECT_EQ(lcns, model);
 }
 
 TEST(TsWriter, SpansJoinIntoTheStreamOfOneSpan) {
