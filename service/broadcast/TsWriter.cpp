@@ -20,6 +20,8 @@
 
 #include "broadcast/DvbSubtitle.h"
 
+// Teletext joins here: the teletext encoder (DvbTeletext.h, encodeTeletextPes) is built beside
+// this writer; once it is part of the build, each service's pages go out in teletext() below.
 #if __has_include("broadcast/DvbTeletext.h")
 #include "broadcast/DvbTeletext.h"
 #define DVB_TS_TELETEXT 1
@@ -475,13 +477,14 @@ void TsWriter::sdt(bool actual) {
             auto add = [entry](uint8_t t, uint8_t l, uint8_t* p) {
                 dvbpsi_sdt_service_descriptor_add(entry, t, l, p);
             };
-            auto d = std::make_unique<dvbpsi_service_dr_t>();
+            dvbpsi_service_dr_t service{};
+            auto* d = &service;
             d->i_service_type = s.type;
             // Provider and name share the descriptor's 255 bytes with its 3 bytes of lengths.
             d->i_service_provider_name_length =
                     copyBytes<uint8_t>(d->i_service_provider_name, s.provider, 126);
             d->i_service_name_length = copyBytes<uint8_t>(d->i_service_name, s.name, 126);
-            put(dvbpsi_GenServiceDr(d.get(), false), add);
+            put(dvbpsi_GenServiceDr(d, false), add);
             if (!s.caSystems.empty()) {
                 dvbpsi_ca_identifier_dr_t ca{};
                 for (uint16_t id : s.caSystems) {
@@ -569,10 +572,10 @@ void TsWriter::nit() {
                 break;
             }
         }
-        auto list = std::make_unique<dvbpsi_service_list_dr_t>();
-        auto lcn = std::make_unique<dvbpsi_lcn_dr_t>();
-        *list = {};
-        *lcn = {};
+        dvbpsi_service_list_dr_t services{};
+        dvbpsi_lcn_dr_t channels{};
+        auto* list = &services;
+        auto* lcn = &channels;
         for (const auto& s : tp.services) {
             if (list->i_service_count < 84) {
                 list->i_service[list->i_service_count].i_service_id = s.id;
@@ -586,10 +589,10 @@ void TsWriter::nit() {
             }
         }
         // libdvbpsi 1.3 gives its service list descriptor the tag 0x83: it is 0x41.
-        dvbpsi_descriptor_t* serviceList = dvbpsi_GenServiceListDr(list.get(), false);
+        dvbpsi_descriptor_t* serviceList = dvbpsi_GenServiceListDr(list, false);
         if (serviceList != nullptr) serviceList->i_tag = 0x41;
         put(serviceList, add);
-        if (lcn->i_number_of_entries > 0) put(dvbpsi_GenLCNDr(lcn.get(), false), add);
+        if (lcn->i_number_of_entries > 0) put(dvbpsi_GenLCNDr(lcn, false), add);
     }
     Sections sections(dvbpsi_nit_sections_generate(st_.psi_, &nit, 0x40));
     dvbpsi_nit_empty(&nit);
@@ -600,13 +603,13 @@ void TsWriter::addEventDescriptors(dvbpsi_eit_event_t* e, const Event& ev) {
     auto add = [e](uint8_t t, uint8_t l, uint8_t* p) {
         dvbpsi_eit_event_descriptor_add(e, t, l, p);
     };
-    auto shortEvent = std::make_unique<dvbpsi_short_event_dr_t>();
-    *shortEvent = {};
+    dvbpsi_short_event_dr_t shortDr{};
+    auto* shortEvent = &shortDr;
     copyLanguage(shortEvent->i_iso_639_code, ev.language);
     // Name and text share the descriptor's 255 bytes with 5 bytes of language and lengths.
     shortEvent->i_event_name_length = copyBytes<int>(shortEvent->i_event_name, ev.name, 125);
     shortEvent->i_text_length = copyBytes<int>(shortEvent->i_text, ev.text, 125);
-    put(dvbpsi_GenShortEventDr(shortEvent.get(), false), add);
+    put(dvbpsi_GenShortEventDr(shortEvent, false), add);
 
     // Extended event descriptors: the items first, then the text, each descriptor within its
     // 255 bytes (6 of them the number, language and lengths); at most 16 descriptors. Written

@@ -2,6 +2,7 @@
 #include "Recording.h"
 
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -30,7 +31,8 @@ bool writeAll(int fd, const uint8_t* p, size_t n) {
 std::shared_ptr<Recording> Recording::create(const std::string& path,
                                              const dvbmodel::Broadcast& broadcast,
                                              const dvbmodel::Service* only, int64_t startMs) {
-    int fd = ::open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0644);
+    int fd = ::open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC,
+                    S_IRUSR | S_IWUSR | S_IRGRP | S_IROTH);
     if (fd < 0) return nullptr;
     return std::shared_ptr<Recording>(new Recording(path, fd, broadcast, only, startMs));
 }
