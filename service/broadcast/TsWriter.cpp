@@ -286,7 +286,8 @@ void TsWriter::plan(int64_t from, int64_t to) {
 }
 
 void TsWriter::write(int64_t from, int64_t millis) {
-    if (millis <= 0) return;
+    // Without a libdvbpsi handle (no memory) there are no tables: nothing goes out.
+    if (millis <= 0 || st_.psi_ == nullptr) return;
     plan(from, from + millis);
     for (const auto& d : st_.due_) send(d);
 }
