@@ -184,11 +184,14 @@ struct RecordingWrite {
 // it closes the file after the lock is released.
 struct RecordingStop {
     RecordingWrite write;
+    bool discard = false;  // the file is not wanted: closed and removed
     RecordingStop() = default;
     RecordingStop(const RecordingStop&) = delete;
     RecordingStop& operator=(const RecordingStop&) = delete;
     ~RecordingStop() {
-        if (write.recording) write.recording->finish(write.until, write.network, write.transport);
+        if (write.recording && discard) write.recording->discard();
+        if (write.recording && !discard)
+            write.recording->finish(write.until, write.network, write.transport);
     }
 };
 

@@ -2,8 +2,6 @@
 #include <algorithm>
 #include <cstring>
 
-#include <unistd.h>
-
 #include "Modules.h"
 
 namespace dvbrx {
@@ -168,20 +166,24 @@ int32_t ReceiverStrm::SetSettings(int32_t handle, const STRM_Settings* settings)
             Recording::create(path, mRx->broadcast(), service, since);
     std::lock_guard<std::mutex> lock(mRx->mLock);
     auto it = mRx->streams.find(handle);
-    bool same = it != mRx->streams.end() && it->second.started && it->second.service == service &&
-                !it->second.shifting;
-    if (recording == nullptr) return same ? kErrPath : kErrNotStarted;
-    if (!same) {
-        // The stream changed meanwhile: the file it was to get is not wanted.
-        stop.write = {std::move(recording), nullptr, nullptr, since};
-        unlink(path.c_str());
+    if (it == mRx->streams.end() || !it->second.started || it->second.service != service) {
+        // Closed, stopped or retuned meanwhile: the file is not wanted.
+        stop.write.recording = std::move(recording);
+        stop.discard = true;
         return it == mRx->streams.end() ? kErrBadHandle : kErrNotStarted;
     }
     Stream& s = it->second;
+    if (s.shifting) {
+        // Another call started time shift meanwhile: its recording stays.
+        stop.write.recording = std::move(recording);
+        stop.discard = true;
+    } else {
+        if (recording == nullptr) return kErrPath;
+        s.shifting = true;
+        s.shiftSince = since;
+        s.recording = std::move(recording);
+    }
     s.settings = *settings;
-    s.shifting = true;
-    s.shiftSince = since;
-    s.recording = std::move(recording);
     shift(s, *settings, mRx->clock().nowMillis());
     return kOk;
 }

@@ -80,4 +80,11 @@ void Recording::finish(int64_t untilMs, const dvbmodel::Network* network,
     mFd = -1;
 }
 
+void Recording::discard() {
+    std::lock_guard<std::mutex> lock(mLock);
+    if (mFd >= 0) ::close(mFd);
+    mFd = -1;
+    ::unlink(mPath.c_str());
+}
+
 }  // namespace dvbrx

@@ -37,6 +37,9 @@ public:
     void finish(int64_t untilMs, const dvbmodel::Network* network,
                 const dvbmodel::Transport* transport);
 
+    // Closes the file and removes it.
+    void discard();
+
     const std::string& path() const { return mPath; }
     int64_t startedAt() const { return mStart; }
     // Bytes in the file and the emulated milliseconds they cover.
