@@ -738,7 +738,7 @@ void TsWriter::eitSchedule(bool actual, int64_t at) {
         int segment;
         Sections sections;
     };
-    std::vector<Group> groups;
+    std::vector<Group> groups, filled;
     std::vector<const Event*> events;
     for (const auto& tp : net_.transports) {
         if ((&tp == &tp_) != actual) continue;
@@ -775,6 +775,20 @@ void TsWriter::eitSchedule(bool actual, int64_t at) {
                 groups.push_back({segment, std::move(sections)});
             }
             if (groups.empty()) continue;
+            // A segment without events goes out as one empty section, up to the last segment
+            // of its table: a decoder completes a table once every segment below it came.
+            filled.clear();
+            for (size_t next = 0, seg = 0; next < groups.size(); ++seg) {
+                if (groups[next].segment == static_cast<int>(seg)) {
+                    filled.push_back(std::move(groups[next++]));
+                } else if (groups[next].segment / kSegmentsPerTable ==
+                           static_cast<int>(seg) / kSegmentsPerTable) {
+                    uint8_t tableId = static_cast<uint8_t>(base + seg / kSegmentsPerTable);
+                    Sections empty = eitSections(tableId, tp, s, nullptr, 0, 0);
+                    if (empty) filled.push_back({static_cast<int>(seg), std::move(empty)});
+                }
+            }
+            groups.swap(filled);
             // last_section_number of each table: the last section of its last segment.
             std::array<uint8_t, 2> lastNumber{};
             for (const auto& g : groups) {

@@ -143,7 +143,8 @@ struct Tables {
     }
     static void attach(dvbpsi_t* h, uint8_t table, uint16_t ext, void* self) {
         auto* t = static_cast<Tables*>(self);
-        if (table == 0x4E) dvbpsi_eit_attach(h, table, ext, keep<dvbpsi_eit_t>, &t->eit);
+        if (table == 0x4E || table == 0x50 || table == 0x51)
+            dvbpsi_eit_attach(h, table, ext, keep<dvbpsi_eit_t>, &t->eit);
         if (table == 0x40) dvbpsi_nit_attach(h, table, ext, keep<dvbpsi_nit_t>, &t->nit);
     }
 };
@@ -161,12 +162,21 @@ TEST(TsWriter, EventsAndLogicalChannelsReadBackInLibdvbpsi) {
     int64_t from = kStart + 7 * 3600 * 1000;
     std::vector<uint8_t> ts;
     TsWriterState state;
-    writeTransport(b, net, tp, from, 2500, ts, state);
+    writeTransport(b, net, tp, from, 20000, ts, state);  // the schedule twice
     Tables tables;
     tables.read(ts);
     for (const auto& s : tp.services) {
-        auto eit = std::find_if(tables.eit.begin(), tables.eit.end(),
-                                [&](auto* e) { return e->i_extension == s.id; });
+        auto eit = std::find_if(tables.eit.begin(), tables.eit.end(), [&](auto* e) {
+            return e->i_extension == s.id && e->i_table_id == 0x4E;
+        });
+        // The schedule: every event from the UTC midnight on, in tables 0x50 and 0x51.
+        std::set<int> schedule, model;
+        for (const auto* e : tables.eit)
+            for (auto* ev = e->p_first_event; ev && e->i_extension == s.id; ev = ev->p_next)
+                if (e->i_table_id != 0x4E) schedule.insert(ev->i_event_id);
+        for (const auto& e : s.events)
+            if (e.start >= from / 86400000 * 86400) model.insert(e.id);
+        EXPECT_EQ(schedule, model) << s.id;
         ASSERT_NE(eit, tables.eit.end()) << s.id;
         const Event* want[2] = {dvbrx::Receiver::eventAt(s, from / 1000),
                                 dvbrx::Receiver::eventAfter(s, from / 1000)};
