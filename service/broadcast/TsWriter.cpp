@@ -154,10 +154,12 @@ uint8_t* packetHeader(std::vector<uint8_t>& out, uint16_t pid, bool start, uint8
     return p + 4;
 }
 
-void putPts(std::vector<uint8_t>& pes, uint64_t pts) {
-    pes.insert(pes.end(), {static_cast<uint8_t>(0x21 | ((pts >> 29) & 0x0E)),
-                           static_cast<uint8_t>(pts >> 22), static_cast<uint8_t>(pts >> 14 | 1),
-                           static_cast<uint8_t>(pts >> 7), static_cast<uint8_t>(pts << 1 | 1)});
+void putPts(uint8_t* p, uint64_t pts) {
+    p[0] = static_cast<uint8_t>(0x21 | ((pts >> 29) & 0x0E));
+    p[1] = static_cast<uint8_t>(pts >> 22);
+    p[2] = static_cast<uint8_t>(pts >> 14 | 1);
+    p[3] = static_cast<uint8_t>(pts >> 7);
+    p[4] = static_cast<uint8_t>(pts << 1 | 1);
 }
 
 const Event* eventAt(const Service& svc, int64_t seconds) {
@@ -221,6 +223,11 @@ private:
     void time(bool offset, int64_t at);
     void pcr(uint16_t pid, int64_t at);
     void pes(uint16_t pid, uint8_t streamId, uint64_t pts, size_t payload, const Component& c);
+    // One PES packet of `n` bytes as transport packets of `pid`: its first `headLen` bytes from
+    // `head`, the others `fill` but the very last, `last`; the last packet padded with
+    // adaptation field stuffing, as packetizePes does, written in place.
+    void packetize(uint16_t pid, const uint8_t* head, size_t headLen, size_t n, uint8_t fill = 0,
+                   uint8_t last = 0);
     void subtitle(const Service& s, uint32_t index, int64_t at);
     void teletext(const Service& s, uint32_t index, int64_t at);
     void addEventDescriptors(dvbpsi_eit_event_t* e, const Event& ev);
@@ -846,12 +853,15 @@ void TsWriter::pcr(uint16_t pid, int64_t at) {
 
 void TsWriter::pes(uint16_t pid, uint8_t streamId, uint64_t pts, size_t payload,
                    const Component& c) {
-    auto& pes = st_.pes_;
-    pes.assign({0x00, 0x00, 0x01, streamId, 0, 0, 0x84, 0x80, 5});
-    putPts(pes, pts);
-    size_t header = pes.size();
-    pes.resize(header + payload, 0);
-    uint8_t* body = pes.data() + header;
+    // The PES header with its PTS, then what the payload starts with; the rest of the payload
+    // is one filler byte, written straight into the packets.
+    uint8_t head[32] = {0x00, 0x00, 0x01, streamId, 0, 0, 0x84, 0x80, 5};
+    putPts(head + 9, pts);
+    size_t length = 8 + payload, headLen = 14;
+    // Video PES longer than the length field holds say 0: unbounded.
+    if (length <= 0xFFFF)
+        head[4] = static_cast<uint8_t>(length >> 8), head[5] = static_cast<uint8_t>(length);
+    uint8_t fill = 0x00, last = 0x00;
     if (c.kind == Kind::Video && (c.streamType == 0x01 || c.streamType == 0x02) && payload >= 12) {
         // Sequence header: size, aspect ratio 16:9, frame rate code, bit rate in 400 bit/s.
         static constexpr struct {
@@ -877,23 +887,51 @@ void TsWriter::pes(uint16_t pid, uint8_t streamId, uint64_t pts, size_t payload,
                                  static_cast<uint8_t>(bits >> 2),
                                  static_cast<uint8_t>((bits & 3) << 6 | 0x20),
                                  0x00};
-        memcpy(body, seq, sizeof seq);
+        memcpy(head + headLen, seq, sizeof seq);
+        headLen += sizeof seq;
     } else if (c.kind == Kind::Video && c.streamType == 0x1B && payload >= 12) {
         // An access unit delimiter, then a filler data unit over the rest (0xFF bytes ending
         // with the stop bit): an access unit that a parser walks but that shows nothing.
         const uint8_t aud[] = {0x00, 0x00, 0x00, 0x01, 0x09, 0xF0, 0x00, 0x00, 0x01, 0x0C};
-        memcpy(body, aud, sizeof aud);
-        memset(body + sizeof aud, 0xFF, payload - sizeof aud - 1);
-        body[payload - 1] = 0x80;
-    } else if (c.kind == Kind::Audio && (c.streamType == 0x03 || c.streamType == 0x04)) {
+        memcpy(head + headLen, aud, sizeof aud);
+        headLen += sizeof aud;
+        fill = 0xFF, last = 0x80;
+    } else if (c.kind == Kind::Audio && (c.streamType == 0x03 || c.streamType == 0x04) &&
+               payload >= 4) {
         // MPEG-1 layer II, no CRC, 192 kbit/s, 48 kHz, stereo.
-        body[0] = 0xFF, body[1] = 0xFD, body[2] = 0xA4, body[3] = 0x00;
+        const uint8_t mpa[] = {0xFF, 0xFD, 0xA4, 0x00};
+        memcpy(head + headLen, mpa, sizeof mpa);
+        headLen += sizeof mpa;
     }
-    size_t length = pes.size() - 6;
-    // Video PES longer than the length field holds say 0: unbounded.
-    if (length <= 0xFFFF)
-        pes[4] = static_cast<uint8_t>(length >> 8), pes[5] = static_cast<uint8_t>(length);
-    packetizePes(pid, pes, st_.continuity_[pid], out_);
+    packetize(pid, head, headLen, 14 + payload, fill, last);
+}
+
+void TsWriter::packetize(uint16_t pid, const uint8_t* head, size_t headLen, size_t n, uint8_t fill,
+                         uint8_t last) {
+    uint8_t& cc = st_.continuity_[pid];
+    size_t base = out_.size();
+    out_.resize(base + (n + 183) / 184 * 188);
+    uint8_t* p = out_.data() + base;
+    for (size_t off = 0; off < n; p += 188) {
+        size_t take = std::min<size_t>(184, n - off);
+        p[0] = 0x47;
+        p[1] = static_cast<uint8_t>((off == 0 ? 0x40 : 0) | (pid >> 8 & 0x1F));
+        p[2] = static_cast<uint8_t>(pid);
+        p[3] = static_cast<uint8_t>((take < 184 ? 0x30 : 0x10) | cc);
+        if (take < 184) {
+            size_t stuffing = 183 - take;
+            p[4] = static_cast<uint8_t>(stuffing);
+            if (stuffing > 0) p[5] = 0x00, memset(p + 6, 0xFF, stuffing - 1);
+        }
+        uint8_t* dst = p + 188 - take;
+        size_t fromHead = off < headLen ? std::min(take, headLen - off) : 0;
+        memcpy(dst, head + off, fromHead);
+        memset(dst + fromHead, fill, take - fromHead);
+        cc = (cc + 1) & 15;
+        off += take;
+    }
+    // The payload of the last packet ends the packet: its last byte ends the PES.
+    if (n > headLen) out_.back() = last;
 }
 
 void TsWriter::subtitle(const Service& s, uint32_t index, int64_t at) {
@@ -906,7 +944,7 @@ void TsWriter::subtitle(const Service& s, uint32_t index, int64_t at) {
             ++st_.stats_.displaySetsDropped;
             continue;
         }
-        packetizePes(c.pid, pes, st_.continuity_[c.pid], out_);
+        packetize(c.pid, pes.data(), pes.size(), pes.size());
     }
 }
 
@@ -921,7 +959,7 @@ void TsWriter::teletext(const Service& s, uint32_t index, int64_t at) {
         if (c.kind != Kind::Teletext) continue;
         std::vector<uint8_t> pes =
                 encodeTeletextPes(&s.teletext[index], count, tsClockAt(at + kTsDecodeDelayMs));
-        if (!pes.empty()) packetizePes(c.pid, pes, st_.continuity_[c.pid], out_);
+        if (!pes.empty()) packetize(c.pid, pes.data(), pes.size(), pes.size());
     }
 #else
     // Teletext pages travel once the teletext encoder is part of the build.

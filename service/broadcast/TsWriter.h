@@ -74,8 +74,7 @@ private:
     dvbpsi_s* psi_;
     std::array<uint8_t, 8192> continuity_{};
     std::vector<Version> versions_;
-    std::vector<Due> due_;      // scratch: what a span sends, in time order
-    std::vector<uint8_t> pes_;  // scratch: one PES packet
+    std::vector<Due> due_;  // scratch: what a span sends, in time order
     TsWriterStats stats_;
 };
 

@@ -13,7 +13,8 @@
 //    rows; target: at most 1.5 times its time;
 //  - a time-shift recording (one television service of the built-in broadcast, 5 minutes of
 //    emulated time: the transport stream made and written to a file) against a plain
-//    sequential write of the same bytes to a file; target: at least 0.8 times its bytes per
+//    sequential write of the same bytes to a file, medians of five runs, wall and CPU time (one
+//    thread does all of the recording's work); target: at least 0.8 times its bytes per
 //    second.
 #include <broadcast/Builtin.h>
 #include <broadcast/DvbText.h>
@@ -366,12 +367,12 @@ void BM_PlainWrite(benchmark::State& state) {
 BENCHMARK(BM_Recording)
         ->Unit(benchmark::kMillisecond)
         ->Iterations(1)
-        ->Repetitions(3)
+        ->Repetitions(5)
         ->UseRealTime();
 BENCHMARK(BM_PlainWrite)
         ->Unit(benchmark::kMillisecond)
         ->Iterations(1)
-        ->Repetitions(3)
+        ->Repetitions(5)
         ->UseRealTime();
 
 BENCHMARK(BM_ReceiverFill)
@@ -497,10 +498,12 @@ int main(int argc, char** argv) {
                     m["BM_BareInsert"].real / m["BM_ReceiverFill"].real);
     }
     if (m.count("BM_Recording") && m.count("BM_PlainWrite")) {
+        // One thread makes and writes the recording: its CPU time counts all of its work.
         std::printf(
-                "recording bytes/s / plain write bytes/s: %.2f wall (%.1f MB in %.0f ms, "
-                "%.0fx real time; target >= 0.8)\n",
-                m["BM_PlainWrite"].real / m["BM_Recording"].real, gRecorded.size() / 1e6,
+                "recording bytes/s / plain write bytes/s: %.2f wall, %.2f CPU (%.1f MB in "
+                "%.0f ms, %.0fx real time; target >= 0.8)\n",
+                m["BM_PlainWrite"].real / m["BM_Recording"].real,
+                m["BM_PlainWrite"].cpu / m["BM_Recording"].cpu, gRecorded.size() / 1e6,
                 m["BM_Recording"].real, kRecordMillis / m["BM_Recording"].real);
     }
     std::filesystem::remove_all(folder());
