@@ -11,14 +11,16 @@
 //   NIT actual                    every 2 s (network name; per transport its delivery system,
 //                                 service list and logical channel numbers)
 //   EIT p/f actual / other        every 2 s
-//   EIT schedule actual / other   every 10 s, 8 days from the span's UTC midnight
+//   EIT schedule actual / other   every 10 s
 //   TDT, TOT                      every 5 s
 //   PCR                           every 40 ms on each PCR PID
 //   video                         one PES per frame at the component's frame rate
 //   audio                         one PES per 24 ms frame
 //   subtitles, teletext           when the model sends them, within its loop
 // Payloads of video and audio are not real pictures or sound: MPEG-2 video frames carry a
-// sequence header, MPEG audio frames are valid silent layer II frames, others are zeros.
+// sequence header, H.264 ones an access unit delimiter and a filler unit, MPEG audio frames
+// are valid silent layer II frames, others are zeros. Each span's EIT schedule is 8 days from
+// the UTC midnight of when it is sent. A state serves the transports of one Broadcast.
 #pragma once
 
 #include <array>
