@@ -448,10 +448,12 @@ void TsWriter::pmt(const Service& s) {
             }
             case Kind::Teletext: {
                 dvbpsi_teletext_dr_t d{};
-                std::vector<TeletextRef> pages = c.pages;
-                if (pages.empty()) pages.push_back({});
-                for (const auto& ref : pages) {
-                    if (d.i_pages_number >= DVBPSI_TELETEXT_DR_MAX) break;
+                // A component that announces no page gets the initial page of magazine 1.
+                const TeletextRef initial{};
+                const TeletextRef* refs = c.pages.empty() ? &initial : c.pages.data();
+                size_t count = c.pages.empty() ? 1 : c.pages.size();
+                for (size_t i = 0; i < count && d.i_pages_number < DVBPSI_TELETEXT_DR_MAX; ++i) {
+                    const TeletextRef& ref = refs[i];
                     auto& page = d.p_pages[d.i_pages_number++];
                     copyLanguage(page.i_iso6392_language_code, c.language);
                     page.i_teletext_type = ref.type;
