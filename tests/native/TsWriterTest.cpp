@@ -159,7 +159,9 @@ TEST(TsWriter, EventsAndLogicalChannelsReadBackInLibdvbpsi) {
     Broadcast b = builtinBroadcast(kStart / 1000);
     const Network& net = b.networks[0];
     const Transport& tp = net.transports[0];
-    int64_t from = kStart + 7 * 3600 * 1000;
+    // The first service's present event ends 5 s into the span: its p/f then takes version 1.
+    const Event* ending = dvbrx::Receiver::eventAt(tp.services[0], kStart / 1000 + 7 * 3600);
+    int64_t from = (ending->start + ending->duration) * 1000 - 5000;
     std::vector<uint8_t> ts;
     TsWriterState state;
     writeTransport(b, net, tp, from, 20000, ts, state);  // the schedule twice
@@ -193,6 +195,11 @@ TEST(TsWriter, EventsAndLogicalChannelsReadBackInLibdvbpsi) {
                       want[i]->name);
         }
     }
+    auto last = std::find_if(tables.eit.rbegin(), tables.eit.rend(), [&](auto* e) {
+        return e->i_extension == tp.services[0].id && e->i_table_id == 0x4E;
+    });
+    EXPECT_EQ((*last)->i_version, 1);
+    EXPECT_EQ((*last)->p_first_event->i_event_id, ending[1].id);
     ASSERT_FALSE(tables.nit.empty());
     std::set<std::array<int, 3>> lcns, model;
     for (const auto* ts = tables.nit[0]->p_first_ts; ts != nullptr; ts = ts->p_next) {
