@@ -82,6 +82,11 @@ public:
     int32_t EpgMd_ClearService() override;
 
 private:
+    // Time shift's play position from `settings` at `now`. Under the lock.
+    void shift(Stream& s, const STRM_Settings& settings, int64_t now);
+    // Hands the stream's recording to `stop`, which closes it once the lock is released.
+    void stopRecording(Stream& s, RecordingStop& stop);
+
     std::shared_ptr<Receiver> mRx;
 };
 

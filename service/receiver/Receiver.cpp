@@ -99,6 +99,14 @@ Receiver::Receiver(dvbmodel::Broadcast broadcast, const Clock::Settings& clock, 
             for (const auto& dvb : dvbsvc::liveDvbs()) dvbsvc::raiseEvent(*dvb, msg, ext1, ext2);
         };
     }
+    const char* dir = getenv("DVB_RECORD_DIR");
+    if (dir != nullptr && *dir != '\0') {
+        recordDir = dir;
+    } else {
+        std::string db = epgDatabasePath();
+        size_t slash = db.rfind('/');
+        recordDir = slash == std::string::npos ? "." : slash == 0 ? "/" : db.substr(0, slash);
+    }
     mClock.onAdvance([this] {
         std::lock_guard<std::mutex> lock(mLock);
         ++mPokes;
@@ -192,8 +200,15 @@ void Receiver::run() {
         }
         int64_t now = mClock.nowMillis();
         auto events = collectEvents(now);
+        // Recordings and the dump catch up with the clock, written outside the lock.
+        std::vector<RecordingWrite> writes;
+        for (const auto& [h, s] : streams) {
+            if (s.recording) writes.push_back(recordingWrite(s.recording, s, now));
+        }
+        if (outputs.dump) writes.push_back(dumpWrite(now));
         lock.unlock();
         for (const auto& e : events) mSink(e[0], e[1], e[2]);
+        for (const auto& w : writes) w.recording->writeUntil(w.until, w.network, w.transport);
         lock.lock();
         // Caught up only once the tasks that tasks posted have run too.
         if (mTasks.empty()) {
@@ -287,6 +302,29 @@ int64_t Receiver::ptsAt(const Stream& s, int64_t from, int64_t ms) const {
     int64_t pts = (mix(mClock.seed(), key, 3) + (ms - from) * 90) % kPtsWrap;
     // Before `from` (a display set sent before the stream began) the count runs backwards.
     return pts < 0 ? pts + kPtsWrap : pts;
+}
+
+std::string Receiver::recordingPath(const Stream& s, int64_t ms) const {
+    return recordDir + "/rec-" + std::to_string(s.transport->onid) + "-" +
+           std::to_string(s.transport->tsid) + "-" + std::to_string(s.service->id) + "-" +
+           std::to_string(ms / 1000) + ".ts";
+}
+
+RecordingWrite Receiver::recordingWrite(std::shared_ptr<Recording> r, const Stream& s,
+                                        int64_t now) const {
+    RecordingWrite w{std::move(r), nullptr, nullptr, now};
+    int64_t from = 0;
+    if (s.started && decoding(s, now, &from)) w.network = s.network, w.transport = s.transport;
+    return w;
+}
+
+RecordingWrite Receiver::dumpWrite(int64_t now) const {
+    RecordingWrite w{outputs.dump, nullptr, nullptr, now};
+    const Frontend& fe = frontends[outputs.dumpFrontend];
+    if (!fe.tuned) return w;
+    Signal sig = signal(fe.params, fe.tunedAt, now);
+    if ((sig.status & kFeLock) != 0) w.network = sig.network, w.transport = sig.transport;
+    return w;
 }
 
 int64_t Receiver::toleranceKHz(dvbmodel::Delivery d) {

@@ -26,6 +26,7 @@
 #include "Clock.h"
 #include "Codes.h"
 #include "EpgDatabase.h"
+#include "Recording.h"
 
 namespace dvbrx {
 
@@ -129,6 +130,8 @@ struct Stream {
     // `shiftPos` (ms into the recording) at `shiftAt` on, at playSpeed / playSpeedDiv.
     bool shifting = false;
     int64_t shiftSince = 0, shiftPos = 0, shiftAt = 0;
+    // The recording that time shift makes, from shiftSince on (null when live).
+    std::shared_ptr<Recording> recording;
     // EPG_GetEvent's cursor: the service it walks and the start of the event it gave last.
     bool epgWalking = false;
     ServiceKey epgService;
@@ -164,6 +167,32 @@ struct Outputs {
     int32_t blindScanDev = 0;
     bool dumping = false;
     std::string dumpPath;
+    int32_t dumpFrontend = 0;
+    std::shared_ptr<Recording> dump;
+};
+
+// A piece of writing for a recording or dump: what is on the air for it up to `until`, decided
+// under the receiver's lock and written outside it.
+struct RecordingWrite {
+    std::shared_ptr<Recording> recording;
+    const dvbmodel::Network* network = nullptr;
+    const dvbmodel::Transport* transport = nullptr;  // null: nothing on the air
+    int64_t until = 0;
+};
+
+// Finishes a recording as it goes out of scope: declared before the receiver's lock is taken,
+// it closes the file after the lock is released.
+struct RecordingStop {
+    RecordingWrite write;
+    bool discard = false;  // the file is not wanted: closed and removed
+    RecordingStop() = default;
+    RecordingStop(const RecordingStop&) = delete;
+    RecordingStop& operator=(const RecordingStop&) = delete;
+    ~RecordingStop() {
+        if (write.recording && discard) write.recording->discard();
+        if (write.recording && !discard)
+            write.recording->finish(write.until, write.network, write.transport);
+    }
 };
 
 class Receiver {
@@ -202,6 +231,8 @@ public:
     std::map<int32_t, Stream> streams;
     std::map<int32_t, Decoder> subtitles, teletexts;
     int32_t nextHandle = 1;
+    // Where time-shift recordings are written: DVB_RECORD_DIR, else the event database's folder.
+    std::string recordDir;
     // The services whose events are collected, in the order added; the database keeps a copy.
     std::vector<EpgSvc> epgServices;
     // EpgMd_ClearService ran since the database was last opened: the list it holds is void.
@@ -245,6 +276,15 @@ public:
     // The 33-bit PTS of a stream decoding since `from`, at `ms`: 90 kHz from an origin of its
     // service's own.
     int64_t ptsAt(const Stream& s, int64_t from, int64_t ms) const;
+
+    // ---- recordings and dumps (Recording.h) -------------------------------------------
+    // The file of a recording of stream `s` that starts at `ms`:
+    // <recordDir>/rec-<onid>-<tsid>-<sid>-<UTC seconds>.ts.
+    std::string recordingPath(const Stream& s, int64_t ms) const;
+    // What recording `r` of stream `s` gets up to `now`: the stream's service while it decodes.
+    RecordingWrite recordingWrite(std::shared_ptr<Recording> r, const Stream& s, int64_t now) const;
+    // What the dump gets up to `now`: the transponder its front end is locked on.
+    RecordingWrite dumpWrite(int64_t now) const;
 
     // ---- event database (ReceiverEpg.cpp), on the service thread ----------------------
     // Opens the database at `path` (an open one at the same path stays), takes the services

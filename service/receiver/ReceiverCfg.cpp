@@ -241,24 +241,39 @@ int32_t ReceiverCfg::BlindScanStop(int32_t dev) {
 }
 
 int32_t ReceiverCfg::TSDumpStart(int32_t dev, int32_t, int32_t, const char* path) {
+    {
+        std::lock_guard<std::mutex> lock(mRx->mLock);
+        if (!mRx->validFrontend(dev)) return kErrBadParameter;
+        if (path == nullptr || memchr(path, 0, kTSDumpPathSize) == nullptr || path[0] == '\0')
+            return kErrPath;
+        if (mRx->outputs.dumping) return kErrBusy;
+        if (!mRx->frontends[dev].tuned) return kErrNotStarted;
+    }
+    // The file is made outside the receiver's lock; the dump starts once it is there.
+    int64_t since = mRx->clock().nowMillis();
+    auto dump = Recording::create(path, mRx->broadcast(), nullptr, since);
+    if (dump == nullptr) return kErrPath;
+    RecordingStop unwanted;
     std::lock_guard<std::mutex> lock(mRx->mLock);
-    if (!mRx->validFrontend(dev)) return kErrBadParameter;
-    if (path == nullptr || memchr(path, 0, kTSDumpPathSize) == nullptr || path[0] == '\0')
-        return kErrPath;
-    if (mRx->outputs.dumping) return kErrBusy;
-    if (!mRx->frontends[dev].tuned) return kErrNotStarted;
-    int fd = open(path, O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0644);
-    if (fd < 0) return kErrPath;
-    close(fd);
+    if (mRx->outputs.dumping) {
+        unwanted.write.recording = std::move(dump);
+        return kErrBusy;
+    }
     mRx->outputs.dumping = true;
     mRx->outputs.dumpPath = path;
+    mRx->outputs.dumpFrontend = dev;
+    mRx->outputs.dump = std::move(dump);
     return kOk;
 }
 
 int32_t ReceiverCfg::TSDumpStop() {
+    RecordingStop stop;
     std::lock_guard<std::mutex> lock(mRx->mLock);
     if (!mRx->outputs.dumping) return kErrNotStarted;
     mRx->outputs.dumping = false;
+    // The file gets the packets up to now and is closed once the lock is released.
+    stop.write = mRx->dumpWrite(mRx->clock().nowMillis());
+    mRx->outputs.dump.reset();
     return kOk;
 }
 

@@ -9,8 +9,6 @@ namespace {
 
 // An audio frame of 1152 samples at 48 kHz lasts 24 ms: 2160 ticks of 90 kHz.
 constexpr int64_t kAudioFrameTicks = 2160;
-// Bit rates of a time-shift recording, bits per second.
-constexpr int64_t kTvBitRate = 4000000, kRadioBitRate = 192000;
 
 void fillEvent(const dvbmodel::Event& ev, uint8_t runStatus, EpgEvent* e, ExtEpgEvent* x) {
     e->evtId = ev.id;
@@ -62,8 +60,12 @@ int32_t ReceiverStrm::Open(const STRM_OpenSettings* settings) {
 }
 
 int32_t ReceiverStrm::Close(int32_t handle) {
+    RecordingStop stop;
     std::lock_guard<std::mutex> lock(mRx->mLock);
-    if (mRx->streams.erase(handle) == 0) return kErrBadHandle;
+    auto it = mRx->streams.find(handle);
+    if (it == mRx->streams.end()) return kErrBadHandle;
+    stopRecording(it->second, stop);
+    mRx->streams.erase(it);
     // Decoders fed by the stream end with it.
     for (auto* decoders : {&mRx->subtitles, &mRx->teletexts}) {
         for (auto it = decoders->begin(); it != decoders->end();) {
@@ -74,11 +76,13 @@ int32_t ReceiverStrm::Close(int32_t handle) {
 }
 
 int32_t ReceiverStrm::Start(int32_t handle, const STRM_Settings* settings) {
+    RecordingStop stop;
     std::lock_guard<std::mutex> lock(mRx->mLock);
     auto it = mRx->streams.find(handle);
     if (it == mRx->streams.end()) return kErrBadHandle;
     if (settings == nullptr || !Receiver::plausible(settings->fe)) return kErrBadParameter;
     Stream& s = it->second;
+    stopRecording(s, stop);
     int64_t now = mRx->clock().nowMillis();
     // Starting a service tunes the stream's front end, as a receiver does.
     mRx->tune(s.frontend, settings->fe);
@@ -103,10 +107,12 @@ int32_t ReceiverStrm::Start(int32_t handle, const STRM_Settings* settings) {
 }
 
 int32_t ReceiverStrm::Stop(int32_t handle, int32_t flag) {
+    RecordingStop stop;
     std::lock_guard<std::mutex> lock(mRx->mLock);
     auto it = mRx->streams.find(handle);
     if (it == mRx->streams.end()) return kErrBadHandle;
     if (!it->second.started) return kErrNotStarted;
+    stopRecording(it->second, stop);
     it->second.started = false;
     it->second.shifting = false;
     // Flag 1 keeps the last picture on the screen; 0 blanks it.
@@ -124,29 +130,74 @@ int32_t ReceiverStrm::GetSettings(int32_t handle, STRM_Settings* settings) {
 }
 
 int32_t ReceiverStrm::SetSettings(int32_t handle, const STRM_Settings* settings) {
+    RecordingStop stop;
+    std::string path;
+    int64_t since = 0;
+    const dvbmodel::Service* service = nullptr;
+    {
+        std::lock_guard<std::mutex> lock(mRx->mLock);
+        if (settings == nullptr) return kErrBadParameter;
+        auto it = mRx->streams.find(handle);
+        if (it == mRx->streams.end()) return kErrBadHandle;
+        Stream& s = it->second;
+        if (!s.started) return kErrNotStarted;
+        bool live =
+                settings->playSpeed == 0 && settings->playSpeedDiv == 0 && settings->posTime == 0;
+        if (!live && (settings->playSpeedDiv <= 0 || settings->posTime < 0))
+            return kErrBadParameter;
+        int64_t now = mRx->clock().nowMillis();
+        if (live) {
+            s.settings = *settings;
+            s.shifting = false;
+            stopRecording(s, stop);
+            return kOk;
+        }
+        if (s.shifting) {
+            s.settings = *settings;
+            shift(s, *settings, now);
+            return kOk;
+        }
+        // Time shift starts: the recording's file is made below, outside the lock.
+        since = now;
+        service = s.service;
+        path = mRx->recordingPath(s, now);
+    }
+    std::shared_ptr<Recording> recording =
+            Recording::create(path, mRx->broadcast(), service, since);
     std::lock_guard<std::mutex> lock(mRx->mLock);
-    if (settings == nullptr) return kErrBadParameter;
     auto it = mRx->streams.find(handle);
-    if (it == mRx->streams.end()) return kErrBadHandle;
+    if (it == mRx->streams.end() || !it->second.started || it->second.service != service) {
+        // Closed, stopped or retuned meanwhile: the file is not wanted.
+        stop.write.recording = std::move(recording);
+        stop.discard = true;
+        return it == mRx->streams.end() ? kErrBadHandle : kErrNotStarted;
+    }
     Stream& s = it->second;
-    if (!s.started) return kErrNotStarted;
-    bool live = settings->playSpeed == 0 && settings->playSpeedDiv == 0 && settings->posTime == 0;
-    if (!live && (settings->playSpeedDiv <= 0 || settings->posTime < 0)) return kErrBadParameter;
-    int64_t now = mRx->clock().nowMillis();
-    s.settings = *settings;
-    if (live) {
-        s.shifting = false;
-        return kOk;
-    }
-    // Time shift: the receiver records from the first such setting on and plays from posTime
-    // seconds into the recording at playSpeed / playSpeedDiv.
-    if (!s.shifting) {
+    if (s.shifting) {
+        // Another call started time shift meanwhile: its recording stays.
+        stop.write.recording = std::move(recording);
+        stop.discard = true;
+    } else {
+        if (recording == nullptr) return kErrPath;
         s.shifting = true;
-        s.shiftSince = now;
+        s.shiftSince = since;
+        s.recording = std::move(recording);
     }
-    s.shiftPos = std::min(int64_t{settings->posTime} * 1000, now - s.shiftSince);
-    s.shiftAt = now;
+    s.settings = *settings;
+    shift(s, *settings, mRx->clock().nowMillis());
     return kOk;
+}
+
+void ReceiverStrm::shift(Stream& s, const STRM_Settings& settings, int64_t now) {
+    // Plays from posTime seconds into the recording at playSpeed / playSpeedDiv.
+    s.shiftPos = std::min(int64_t{settings.posTime} * 1000, now - s.shiftSince);
+    s.shiftAt = now;
+}
+
+void ReceiverStrm::stopRecording(Stream& s, RecordingStop& stop) {
+    if (!s.recording) return;
+    stop.write = mRx->recordingWrite(std::move(s.recording), s, mRx->clock().nowMillis());
+    s.recording.reset();
 }
 
 int32_t ReceiverStrm::GetStatus(int32_t handle, STRM_GetStatus* status) {
@@ -190,10 +241,10 @@ int32_t ReceiverStrm::GetStatus(int32_t handle, STRM_GetStatus* status) {
     }
     if (s.shifting) {
         int64_t recorded = now - s.shiftSince;
-        int64_t bitRate = video != nullptr ? kTvBitRate : kRadioBitRate;
         status->recstate = kPvrActive;
-        status->recduration = static_cast<int32_t>(recorded / 1000);
-        status->recsize = recorded * bitRate / 8000;
+        // What the file holds so far: the service thread writes it as the clock moves.
+        status->recduration = static_cast<int32_t>(s.recording ? s.recording->millis() / 1000 : 0);
+        status->recsize = s.recording ? s.recording->bytes() : 0;
         const dvbmodel::Event* recEvent = Receiver::eventAt(svc, s.shiftSince / 1000);
         status->recevent = recEvent != nullptr ? recEvent->id : 0;
         status->recstartTime = static_cast<int32_t>(s.shiftSince / 1000);
