@@ -233,16 +233,6 @@ struct Lcn {
     bool visible = true;
 };
 
-// CRC-32/MPEG-2 of a section: 0 over a whole section that is sound.
-uint32_t crc32(const uint8_t* p, size_t n) {
-    uint32_t crc = 0xFFFFFFFF;
-    for (size_t i = 0; i < n; ++i) {
-        crc ^= uint32_t(p[i]) << 24;
-        for (int k = 0; k < 8; ++k) crc = crc & 0x80000000 ? crc << 1 ^ 0x04C11DB7 : crc << 1;
-    }
-    return crc;
-}
-
 // The sections of one PID, reassembled from its packets. libdvbpsi 1.3.3 mis-reads a section
 // whose 3-byte header straddles two packets (it then reports a bad CRC and loses the section
 // and often the next), so sections are assembled and CRC-checked here and handed to libdvbpsi
@@ -546,10 +536,14 @@ void Reader::onSdt(void* data, dvbpsi_sdt_t* sdt) {
                 s.provider = bytes(x->i_service_provider_name, x->i_service_provider_name_length);
                 s.name = bytes(x->i_service_name, x->i_service_name_length);
             } else if (d->i_tag == 0x53) {
-                auto* x = dvbpsi_DecodeCAIdentifierDr(d);
-                if (x == nullptr) return void(++r->stats_.descriptorsDropped);
-                for (int i = 0; i < x->i_number; ++i)
-                    s.caSystems.push_back(x->p_system[i].i_ca_system_id);
+                // CA identifier, read by hand: libdvbpsi 1.3.3's decoder keeps only the high
+                // byte of each 16-bit CA system id.
+                if (d->i_length % 2 != 0) return void(++r->stats_.descriptorsDropped);
+                for (int i = 0; i + 1 < d->i_length; i += 2) {
+                    uint16_t id = uint16_t(d->p_data[i] << 8 | d->p_data[i + 1]);
+                    if (std::find(s.caSystems.begin(), s.caSystems.end(), id) == s.caSystems.end())
+                        s.caSystems.push_back(id);
+                }
             }
         });
         list.push_back(std::move(s));
@@ -737,7 +731,8 @@ void Reader::packet(const uint8_t* p) {
     const bool start = p[1] & 0x40;
     sections_[pid].feed(p + offset, kPacket - offset, start, lost, [&](const uint8_t* s, size_t n) {
         // TOT carries a CRC without the section syntax; TDT carries none.
-        if (((s[1] & 0x80) || s[0] == 0x73) && crc32(s, n) != 0) return void(++stats_.crcErrors);
+        if (((s[1] & 0x80) || s[0] == 0x73) && sectionCrc32(s, n) != 0)
+            return void(++stats_.crcErrors);
         if (pid == kPidEit) return eitSection(s, n);
         push(h, pid, s, n);
     });
@@ -761,7 +756,7 @@ void Reader::eitSection(const uint8_t* s, size_t n) {
     memcpy(one, s, n);
     one[6] = one[7] = one[12] = 0;
     one[13] = one[0];
-    const uint32_t crc = crc32(one, n - 4);
+    const uint32_t crc = sectionCrc32(one, n - 4);
     for (int i = 0; i < 4; ++i) one[n - 4 + i] = uint8_t(crc >> (24 - 8 * i));
     push(eit_, kPidEit, one, n);
     push(eit_, kPidEit, one, n);
@@ -1110,6 +1105,15 @@ bool readTransportStreamFile(const std::string& path, TsCapture& out, std::strin
             readTransportStream(static_cast<const uint8_t*>(map), size, path, out, error, stats);
     munmap(map, size);
     return ok;
+}
+
+uint32_t sectionCrc32(const uint8_t* p, size_t n) {
+    uint32_t crc = 0xFFFFFFFF;
+    for (size_t i = 0; i < n; ++i) {
+        crc ^= uint32_t(p[i]) << 24;
+        for (int k = 0; k < 8; ++k) crc = crc & 0x80000000 ? crc << 1 ^ 0x04C11DB7 : crc << 1;
+    }
+    return crc;
 }
 
 }  // namespace dvbmodel

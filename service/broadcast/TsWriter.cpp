@@ -1,5 +1,6 @@
 // Writing the broadcast model as a transport stream; see TsWriter.h.
 #include "broadcast/TsWriter.h"
+#include "broadcast/TsReader.h"
 
 // clang-format off
 #include <dvbpsi/dvbpsi.h>
@@ -138,8 +139,10 @@ uint32_t fnv(uint32_t h, const uint8_t* p, size_t n) {
     return h;
 }
 
+// A section's bytes: a TOT ends with a CRC_32 as the long sections do.
 size_t sectionSize(const dvbpsi_psi_section_t* s) {
-    return static_cast<size_t>(s->p_payload_end - s->p_data) + (s->b_syntax_indicator ? 4 : 0);
+    bool crc = s->b_syntax_indicator || s->i_table_id == 0x73;
+    return static_cast<size_t>(s->p_payload_end - s->p_data) + (crc ? 4 : 0);
 }
 
 // Fills one transport packet's header and returns where its payload goes.
@@ -835,6 +838,15 @@ void TsWriter::time(bool offset, int64_t at) {
     }
     Sections sections(dvbpsi_tot_sections_generate(st_.psi_, &tot));
     dvbpsi_tot_empty(&tot);
+    // A TOT ends with a CRC_32 though it has no long section syntax; libdvbpsi 1.3.3 writes
+    // neither the CRC nor its 4 bytes in the section length. The buffer has room for them.
+    for (auto* s = sections.get(); s != nullptr && offset; s = s->p_next) {
+        size_t n = sectionSize(s);
+        s->p_data[1] = uint8_t((s->p_data[1] & 0xF0) | (n - 3) >> 8);
+        s->p_data[2] = uint8_t(n - 3);
+        uint32_t crc = sectionCrc32(s->p_data, n - 4);
+        for (int k = 0; k < 4; ++k) s->p_data[n - 4 + k] = uint8_t(crc >> (24 - 8 * k));
+    }
     sendSections(kTdtPid, sections.get(), uint64_t{tot.i_table_id} << 48);
 }
 
