@@ -83,7 +83,7 @@ Sent<dvbmodel::DisplaySet> currentSet(const Receiver& rx, const Stream& s, const
                                       int64_t now, int64_t* from) {
     if (!rx.decoding(s, now, from)) return {};
     return lastSent(
-            s.service->subtitles, rx.broadcast(), now,
+            s.service->subtitles, rx.broadcastOf(s), now,
             [&](const dvbmodel::DisplaySet& set) { return set.pageId == d.compositionPageId; });
 }
 
@@ -95,7 +95,7 @@ Sent<dvbmodel::TeletextPage> currentPage(const Receiver& rx, const Stream& s, co
                                          int64_t now) {
     int64_t from;
     if (!rx.decoding(s, now, &from)) return {};
-    return lastSent(s.service->teletext, rx.broadcast(), now,
+    return lastSent(s.service->teletext, rx.broadcastOf(s), now,
                     [&](const dvbmodel::TeletextPage& p) { return selected(d, p); });
 }
 

@@ -84,6 +84,7 @@ public:
 private:
     // Time shift's play position from `settings` at `now`. Under the lock.
     void shift(Stream& s, const STRM_Settings& settings, int64_t now);
+    int32_t startPlayback(Stream& s, const STRM_Settings& settings, int64_t now);
     // Hands the stream's recording to `stop`, which closes it once the lock is released.
     void stopRecording(Stream& s, RecordingStop& stop);
 

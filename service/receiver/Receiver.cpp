@@ -288,6 +288,10 @@ std::vector<std::array<int, 3>> Receiver::collectEvents(int64_t now) {
 
 bool Receiver::decoding(const Stream& s, int64_t now, int64_t* from) const {
     if (!s.started || s.service == nullptr) return false;
+    if (s.playback) {
+        *from = s.startedAt;
+        return true;
+    }
     const Frontend& fe = frontends[s.frontend];
     Signal sig = signal(fe.params, fe.tunedAt, now);
     if (sig.transport != s.transport || (sig.status & kFeLock) == 0) return false;

@@ -120,6 +120,9 @@ struct Scan {
 struct Stream {
     int32_t frontend = 0, demux = 0;
     bool started = false, frozen = false;
+    // A stream opened on a file (szPath) plays that file's broadcast, from its start at the
+    // moment the stream starts and in a loop, instead of what a front end receives.
+    std::shared_ptr<dvbmodel::Broadcast> playback;
     STRM_Settings settings{};
     int64_t startedAt = 0;
     const dvbmodel::Network* network = nullptr;
@@ -211,6 +214,10 @@ public:
 
     Clock& clock() { return mClock; }
     const dvbmodel::Broadcast& broadcast() const { return mBroadcast; }
+    // The broadcast a stream plays: its file's, or the one on the air.
+    const dvbmodel::Broadcast& broadcastOf(const Stream& s) const {
+        return s.playback ? *s.playback : mBroadcast;
+    }
 
     // Returns once the service thread has caught up with the clock as it reads now: every
     // event due by then has been raised.

@@ -3,6 +3,7 @@
 #include <cstring>
 
 #include "Modules.h"
+#include "broadcast/TsReader.h"
 
 namespace dvbrx {
 namespace {
@@ -45,18 +46,56 @@ int32_t ReceiverStrm::Init() {
 }
 
 int32_t ReceiverStrm::Open(const STRM_OpenSettings* settings) {
-    std::lock_guard<std::mutex> lock(mRx->mLock);
     if (settings == nullptr || !mRx->validFrontend(settings->frontend) || settings->demux < 0 ||
         memchr(settings->szPath, 0, sizeof settings->szPath) == nullptr)
         return kErrBadParameter;
-    // Playing a recording back comes with the transport-stream reader.
-    if (settings->szPath[0] != '\0') return kErrNotSupported;
+    // A path names a transport stream to play back (a recording, a dump, a capture): read
+    // outside the lock, as every file is.
+    std::shared_ptr<dvbmodel::Broadcast> playback;
+    if (settings->szPath[0] != '\0') {
+        dvbmodel::TsCapture capture;
+        dvbmodel::TsReadStats stats;
+        std::string error;
+        if (!dvbmodel::readTransportStreamFile(settings->szPath, capture, error, stats) ||
+            !capture.hasActual)
+            return kErrPath;
+        playback = std::make_shared<dvbmodel::Broadcast>();
+        playback->networks = std::move(capture.networks);
+        playback->loopMillis = capture.durationMs;
+    }
+    std::lock_guard<std::mutex> lock(mRx->mLock);
     if (mRx->streams.size() >= kMaxHandles) return kErrTooMany;
     int32_t h = mRx->newHandle();
     Stream& s = mRx->streams[h];
     s.frontend = settings->frontend;
     s.demux = settings->demux;
+    s.playback = std::move(playback);
     return h;
+}
+
+// A stream on a file starts the file's service `svcId` from the file's start; the front end
+// and its settings play no part.
+int32_t ReceiverStrm::startPlayback(Stream& s, const STRM_Settings& settings, int64_t now) {
+    s.settings = settings;
+    s.started = false;
+    for (const auto& net : s.playback->networks) {
+        for (const auto& tp : net.transports) {
+            for (const auto& candidate : tp.services) {
+                if (candidate.id != settings.svcId || candidate.components.empty()) continue;
+                s.started = true;
+                s.frozen = false;
+                s.startedAt = now;
+                s.playback->start = now / 1000;
+                s.network = &net;
+                s.transport = &tp;
+                s.service = &candidate;
+                s.reportedEvent = -1;
+                s.shifting = false;
+                return kOk;
+            }
+        }
+    }
+    return kErrNoService;
 }
 
 int32_t ReceiverStrm::Close(int32_t handle) {
@@ -80,8 +119,12 @@ int32_t ReceiverStrm::Start(int32_t handle, const STRM_Settings* settings) {
     std::lock_guard<std::mutex> lock(mRx->mLock);
     auto it = mRx->streams.find(handle);
     if (it == mRx->streams.end()) return kErrBadHandle;
-    if (settings == nullptr || !Receiver::plausible(settings->fe)) return kErrBadParameter;
     Stream& s = it->second;
+    if (settings != nullptr && s.playback) {
+        stopRecording(s, stop);
+        return startPlayback(s, *settings, mRx->clock().nowMillis());
+    }
+    if (settings == nullptr || !Receiver::plausible(settings->fe)) return kErrBadParameter;
     stopRecording(s, stop);
     int64_t now = mRx->clock().nowMillis();
     // Starting a service tunes the stream's front end, as a receiver does.
@@ -145,6 +188,8 @@ int32_t ReceiverStrm::SetSettings(int32_t handle, const STRM_Settings* settings)
                 settings->playSpeed == 0 && settings->playSpeedDiv == 0 && settings->posTime == 0;
         if (!live && (settings->playSpeedDiv <= 0 || settings->posTime < 0))
             return kErrBadParameter;
+        // A file played back is not recorded again.
+        if (!live && s.playback) return kErrNotSupported;
         int64_t now = mRx->clock().nowMillis();
         if (live) {
             s.settings = *settings;
@@ -218,13 +263,13 @@ int32_t ReceiverStrm::GetStatus(int32_t handle, STRM_GetStatus* status) {
     status->feBer = sig.ber;
     status->feSnr = sig.snr;
     const dvbmodel::Service& svc = *s.service;
-    bool onAir = sig.transport == s.transport && (sig.status & kFeLock) != 0;
+    bool onAir = s.playback || (sig.transport == s.transport && (sig.status & kFeLock) != 0);
     bool blocked = svc.scrambled && mRx->outputs.caStandby;
     const auto* video = component(svc, dvbmodel::Kind::Video, s.settings.videoPid);
     const auto* audio = component(svc, dvbmodel::Kind::Audio, s.settings.audioPid);
     status->pictureStatus = onAir && blocked ? kScrambled : kNoPicture;
     if (onAir && !blocked) {
-        int64_t from = std::max(s.startedAt, sig.lockedAt);
+        int64_t from = s.playback ? s.startedAt : std::max(s.startedAt, sig.lockedAt);
         int64_t pts = mRx->ptsAt(s, from, now);
         status->localPts = static_cast<int32_t>(static_cast<uint32_t>(pts));
         if (video != nullptr && video->frameRateMilli > 0) {
@@ -238,6 +283,14 @@ int32_t ReceiverStrm::GetStatus(int32_t handle, STRM_GetStatus* status) {
             status->audioPts = static_cast<int32_t>(
                     static_cast<uint32_t>(pts / kAudioFrameTicks * kAudioFrameTicks));
         }
+    }
+    if (s.playback) {
+        // A file plays in a loop from where the stream started.
+        int64_t loop = s.playback->loopMillis, pos = now - s.startedAt;
+        status->pbstate = kPvrActive;
+        status->pbposition = static_cast<int32_t>((loop > 0 ? pos % loop : pos) / 1000);
+        status->pbstartTime = static_cast<int32_t>(s.startedAt / 1000);
+        status->pbendTime = static_cast<int32_t>((s.startedAt + loop) / 1000);
     }
     if (s.shifting) {
         int64_t recorded = now - s.shiftSince;

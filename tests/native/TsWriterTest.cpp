@@ -331,6 +331,33 @@ TEST(TsRecording, TimeShiftRecordsTheServiceAndADumpTheTransponder) {
     ASSERT_EQ(strm->Stop(h, 0), dvbrx::kOk);
     ASSERT_EQ(cfg->TSDumpStop(), dvbrx::kOk);
     EXPECT_GT(static_cast<int64_t>(fs::file_size(file)), st.recsize);  // up to the stop
+
+    // The recording plays back through a stream opened on its path, its own service only.
+    STRM_OpenSettings back{};
+    snprintf(back.szPath, sizeof back.szPath, "%s", (dir / "missing.ts").c_str());
+    EXPECT_EQ(strm->Open(&back), dvbrx::kErrPath);
+    ASSERT_LT(file.size(), sizeof back.szPath);
+    snprintf(back.szPath, sizeof back.szPath, "%s", file.c_str());
+    int32_t p = strm->Open(&back);
+    STRM_Settings play{};
+    play.svcId = tp->services[1].id;
+    EXPECT_EQ(strm->Start(p, &play), dvbrx::kErrNoService);
+    play.svcId = svc.id;
+    ASSERT_EQ(strm->Start(p, &play), dvbrx::kOk);
+    advance(1500);
+    STRM_GetStatus pb{};
+    strm->GetStatus(p, &pb);
+    STRM_StreamInfo info{};
+    ASSERT_EQ(strm->CreatStreamInfo(p, &info), dvbrx::kOk);
+    auto count = [&svc](Kind k) {
+        return std::count_if(svc.components.begin(), svc.components.end(),
+                             [k](const Component& c) { return c.kind == k; });
+    };
+    EXPECT_EQ(std::make_tuple(pb.pbstate, pb.pbposition, info.videoCount, info.audioCount,
+                              info.subtitleCount),
+              std::make_tuple(int32_t{dvbrx::kPvrActive}, 1, count(Kind::Video), count(Kind::Audio),
+                              count(Kind::Subtitle)));
+    EXPECT_EQ(strm->SetSettings(p, &s), dvbrx::kErrNotSupported);  // not recorded again
     NEED_FFPROBE();
     EXPECT_EQ(probe(file), expected(*tp, &svc));
     EXPECT_EQ(probe(dir / "dump.ts"), expected(*tp));
