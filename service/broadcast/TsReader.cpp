@@ -354,6 +354,9 @@ private:
     TsReadStats& stats_;
     dvbpsi_t *pat_ = nullptr, *nit_ = nullptr, *sdt_ = nullptr, *eit_ = nullptr, *tdt_ = nullptr;
     std::map<uint16_t, std::pair<uint16_t, dvbpsi_t*>> pmts_;  // by PID: program, decoder
+    // PIDs whose sections are read (the SI PIDs and every PMT's): the walk over the others
+    // stops at this look-up.
+    std::array<bool, 8192> sectionPid_{};
     std::array<int8_t, 8192> continuity_{};
     std::map<uint16_t, SectionAssembler> sections_;  // of the SI and PMT PIDs
     std::map<uint16_t, uint8_t> pushed_;             // continuity of the packets pushed
@@ -390,6 +393,7 @@ void Reader::onPat(void* data, dvbpsi_pat_t* pat) {
         dvbpsi_t* h = dvbpsi_new(&Reader::message, DVBPSI_MSG_ERROR);
         if (h != nullptr && dvbpsi_pmt_attach(h, p->i_number, &Reader::onPmt, r)) {
             r->pmts_[p->i_pid] = {p->i_number, h};
+            r->sectionPid_[p->i_pid] = true;
         } else if (h != nullptr) {
             dvbpsi_delete(h);
         }
@@ -724,6 +728,7 @@ void Reader::packet(const uint8_t* p) {
                   : pid == kPidTdt ? tdt_
                                    : nullptr;
     if (h == nullptr) {
+        if (!sectionPid_[pid]) return;
         auto it = pmts_.find(pid);
         if (it == pmts_.end()) return;
         h = it->second.second;

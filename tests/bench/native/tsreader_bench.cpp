@@ -1,0 +1,128 @@
+// Reading transport streams held in memory: the French multiplex's capture repeated to 1 GB.
+//  - BM_BareWalk: sync byte and PID of every packet, nothing else: the floor;
+//  - BM_UnaskedPids: the reader over the same packets with every PID moved to one that no
+//    table names (target: at most 1.2 times the bare walk);
+//  - BM_SiOnly: the reader building the broadcast model from the SI;
+//  - BM_SiAndEpg: the same, then every service's schedule stored in an event database as the
+//    receiver stores it (target: at least 100 times the capture's own broadcast rate).
+// Counters: MB/s, x_bare (time over the bare walk's in the same run) and x_broadcast (bytes per
+// second over the capture's bytes per second of broadcast). The capture comes from
+// ../shared/testdata beside the project; without it nothing runs.
+#include <broadcast/TsReader.h>
+#include <receiver/Receiver.h>
+
+#include <benchmark/benchmark.h>
+
+#include <chrono>
+#include <cstdio>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <vector>
+
+namespace {
+
+using namespace dvbmodel;
+using Clock = std::chrono::steady_clock;
+
+constexpr size_t kBytes = size_t{1} << 30;
+
+struct Stream {
+    std::vector<uint8_t> ts, unasked;
+    double broadcastRate = 0;  // the capture's bytes per second of broadcast
+    double bareSeconds = 0;    // one bare walk, measured first
+};
+
+uint64_t bareWalk(const std::vector<uint8_t>& ts) {
+    uint64_t sum = 0;
+    for (size_t i = 0; i + 188 <= ts.size(); i += 188) {
+        if (ts[i] == 0x47) sum += (ts[i + 1] & 0x1F) << 8 | ts[i + 2];
+    }
+    return sum;
+}
+
+const Stream& stream() {
+    static const Stream s = [] {
+        Stream s;
+        std::ifstream in(DVB_TESTDATA_DIR "/fr-dvbt-multiplex-si.ts", std::ios::binary);
+        std::vector<uint8_t> one(std::istreambuf_iterator<char>(in), {});
+        if (one.empty()) return s;
+        TsCapture c;
+        TsReadStats stats;
+        std::string error;
+        readTransportStream(one.data(), one.size(), "capture", c, error, stats);
+        s.broadcastRate = one.size() / (c.durationMs / 1000.0);
+        while (s.ts.size() + one.size() <= kBytes) s.ts.insert(s.ts.end(), one.begin(), one.end());
+        s.unasked = s.ts;
+        for (size_t i = 0; i + 188 <= s.unasked.size(); i += 188) {
+            s.unasked[i + 1] = (s.unasked[i + 1] & 0xE0) | 0x10;  // PID 0x1000..0x10FF
+        }
+        auto t0 = Clock::now();
+        benchmark::DoNotOptimize(bareWalk(s.ts));
+        s.bareSeconds = std::chrono::duration<double>(Clock::now() - t0).count();
+        return s;
+    }();
+    return s;
+}
+
+void report(benchmark::State& state, const std::vector<uint8_t>& ts, Clock::time_point t0) {
+    const Stream& s = stream();
+    double seconds = std::chrono::duration<double>(Clock::now() - t0).count() / state.iterations();
+    state.counters["MB/s"] = ts.size() / seconds / 1e6;
+    state.counters["x_bare"] = seconds / s.bareSeconds;
+    state.counters["x_broadcast"] = ts.size() / seconds / s.broadcastRate;
+}
+
+bool have(benchmark::State& state) {
+    if (!stream().ts.empty()) return true;
+    state.SkipWithError("no capture at " DVB_TESTDATA_DIR);
+    return false;
+}
+
+void BM_BareWalk(benchmark::State& state) {
+    if (!have(state)) return;
+    auto t0 = Clock::now();
+    for (auto _ : state) benchmark::DoNotOptimize(bareWalk(stream().ts));
+    report(state, stream().ts, t0);
+}
+
+// Reads `ts`, then stores the schedules when `epg` is given.
+void read(benchmark::State& state, const std::vector<uint8_t>& ts, bool epg) {
+    if (!have(state)) return;
+    std::string path = std::filesystem::temp_directory_path() / "tsreader-bench.db";
+    auto t0 = Clock::now();
+    for (auto _ : state) {
+        TsCapture c;
+        TsReadStats stats;
+        std::string error;
+        readTransportStream(ts.data(), ts.size(), "bench", c, error, stats);
+        if (!epg) continue;
+        for (const char* end : {"", "-wal", "-shm"}) std::filesystem::remove(path + end);
+        auto db = dvbrx::EpgDatabase::open(path, &error);
+        int64_t today = c.firstUtc / 86400 * 86400;
+        for (const Network& n : c.networks)
+            for (const Transport& t : n.transports)
+                for (const Service& svc : t.services)
+                    dvbrx::storeSchedule(*db, {t.onid, t.tsid, svc.id}, svc, today);
+    }
+    report(state, ts, t0);
+}
+
+void BM_UnaskedPids(benchmark::State& state) {
+    read(state, stream().unasked, false);
+}
+void BM_SiOnly(benchmark::State& state) {
+    read(state, stream().ts, false);
+}
+void BM_SiAndEpg(benchmark::State& state) {
+    read(state, stream().ts, true);
+}
+
+BENCHMARK(BM_BareWalk)->Unit(benchmark::kMillisecond)->Iterations(3);
+BENCHMARK(BM_UnaskedPids)->Unit(benchmark::kMillisecond)->Iterations(3);
+BENCHMARK(BM_SiOnly)->Unit(benchmark::kMillisecond)->Iterations(1);
+BENCHMARK(BM_SiAndEpg)->Unit(benchmark::kMillisecond)->Iterations(1);
+
+}  // namespace
+
+BENCHMARK_MAIN();
