@@ -5,9 +5,13 @@
 //  - BM_SiOnly: the reader building the broadcast model from the SI;
 //  - BM_SiAndEpg: the same, then every service's schedule stored in an event database as the
 //    receiver stores it (target: at least 100 times the capture's own broadcast rate).
+//  - BM_SubtitleDecode: the display sets of dvbsub-canalplus-cinema.ts (PID 0x0157) decoded
+//    from its PES packets, display sets per second and x_broadcast, that rate over the
+//    capture's own display sets per second (target: at least 50 streams on one core).
 // Counters: MB/s, x_bare (time over the bare walk's in the same run) and x_broadcast (bytes per
 // second over the capture's bytes per second of broadcast). The capture comes from
 // ../shared/testdata beside the project; without it nothing runs.
+#include <broadcast/DvbSubtitle.h>
 #include <broadcast/TsReader.h>
 #include <receiver/Receiver.h>
 
@@ -118,6 +122,33 @@ void BM_SiAndEpg(benchmark::State& state) {
     read(state, stream().ts, true);
 }
 
+void BM_SubtitleDecode(benchmark::State& state) {
+    std::ifstream in(DVB_TESTDATA_DIR "/dvbsub-canalplus-cinema.ts", std::ios::binary);
+    std::vector<uint8_t> ts(std::istreambuf_iterator<char>(in), {});
+    std::vector<std::vector<uint8_t>> pes;
+    PesAssembler(0x0157).feed(ts.data(), ts.size(), pes);
+    TsCapture c;
+    TsReadStats stats;
+    std::string error;
+    if (pes.empty() || !readTransportStream(ts.data(), ts.size(), "capture", c, error, stats)) {
+        state.SkipWithError("no capture at " DVB_TESTDATA_DIR);
+        return;
+    }
+    size_t sets = 0;
+    auto t0 = Clock::now();
+    for (auto _ : state) {
+        DvbSubtitleDecoder decoder(3, 4);
+        std::vector<DisplaySet> out;
+        for (const auto& p : pes) decoder.feed(p.data(), p.size(), out);
+        sets += out.size();
+    }
+    double seconds = std::chrono::duration<double>(Clock::now() - t0).count();
+    state.counters["sets/s"] = sets / seconds;
+    state.counters["x_broadcast"] =
+            sets / seconds / (double(sets) / state.iterations() / (c.durationMs / 1000.0));
+}
+
+BENCHMARK(BM_SubtitleDecode)->Unit(benchmark::kMicrosecond);
 BENCHMARK(BM_BareWalk)->Unit(benchmark::kMillisecond)->Iterations(3);
 BENCHMARK(BM_UnaskedPids)->Unit(benchmark::kMillisecond)->Iterations(3);
 BENCHMARK(BM_SiOnly)->Unit(benchmark::kMillisecond)->Iterations(1);
