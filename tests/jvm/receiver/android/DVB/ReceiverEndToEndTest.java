@@ -2,6 +2,7 @@ package android.DVB;
 
 import static org.junit.jupiter.api.Assertions.*;
 
+import java.awt.image.BufferedImage;
 import java.io.BufferedReader;
 import java.io.File;
 import java.io.IOException;
@@ -11,6 +12,7 @@ import java.nio.ByteBuffer;
 import java.nio.ByteOrder;
 import java.nio.charset.StandardCharsets;
 import java.util.*;
+import javax.imageio.ImageIO;
 import org.junit.jupiter.api.*;
 
 /**
@@ -167,7 +169,7 @@ class ReceiverEndToEndTest {
 
     @Test
     @Order(4)
-    void subtitlesAndTeletextOfThePlayingService() throws InterruptedException {
+    void subtitlesAndTeletextOfThePlayingService() throws Exception {
         Strm.SubtitleContent sc = new Strm.SubtitleContent();
         dvb.getStrm().Strm_GetSubTilteStreamInfo(0, sc);
         Subttl sub = dvb.getSubttl();
@@ -177,12 +179,21 @@ class ReceiverEndToEndTest {
         s.compositionPageId = sc.compositionPageId;
         s.ancillaryPageId = sc.ancillaryPageId;
         s.hstrm = stream;
+        // A dump of the transponder runs meanwhile, for ffmpeg to render its subtitles.
+        File dump = new File(EPG_DB.getParent(), "e2e-dump.ts");
+        assertEquals(0, dvb.getCfg().Cfg_TSDumpStart(0, 0, 0, dump.getPath()));
         long decoder = sub.Subttl_Start(s);
-        int regions = next(240).get(2);
-        while (regions == 0) regions = next(240).get(2);
+        next(240); // the display set on the air at the start, sent before the dump began
+        while (next(240).get(2) == 0) continue;
         Subttl.SUBTTL_Data_t data = new Subttl.SUBTTL_Data_t();
         assertEquals(0, sub.Subttl_GetData(decoder, data));
         assertTrue(data.numRegions > 0 && data.numCluts > 0);
+        BufferedImage shown = Compose.displaySet(sub, data, 720, 576);
+        Thread.sleep(200);
+        assertEquals(0, dvb.getCfg().Cfg_TSDumpStop());
+        List<Integer> differing = ffmpegFrames(dump, sc.pid).stream().map(f -> Compose.differing(f, shown))
+                .collect(java.util.stream.Collectors.toList());
+        assertTrue(differing.isEmpty() || differing.contains(0), "ffmpeg renders what the readers give: " + differing);
         Subttl.SUBTTL_Region_t region = new Subttl.SUBTTL_Region_t();
         sub.Subttl_GetRegionData(0, region);
         assertEquals(region.i_width * region.i_height, region.p_pixbuf.length);
@@ -234,6 +245,32 @@ class ReceiverEndToEndTest {
         List<String> reopened = lines(child(db, "open", List.of(service)));
         assertEquals("open 0", reopened.get(0));
         assertTrue(reopened.get(1).matches("event 0 [1-9][0-9]* [1-9][0-9]*"), reopened.toString());
+    }
+
+    /**
+     * ffmpeg's rendering of subtitle PID `pid` of transport stream `ts`, a frame per display set;
+     * none where ffmpeg is not installed (the 32-bit build has none).
+     */
+    static List<BufferedImage> ffmpegFrames(File ts, int pid) throws Exception {
+        File dir = new File(ts.getParent(), "e2e-frames");
+        List<BufferedImage> frames = new ArrayList<>();
+        if (dir.exists()) for (File f : dir.listFiles()) f.delete();
+        dir.mkdirs();
+        try {
+            String sub = new File(dir, "sub.ts").getPath();
+            assertEquals(0, new ProcessBuilder("ffmpeg", "-nostdin", "-loglevel", "error", "-y", "-i", ts.getPath(),
+                    "-map", "0:i:" + pid, "-c", "copy", "-f", "mpegts", sub).inheritIO().start().waitFor());
+            assertEquals(0, new ProcessBuilder("ffmpeg", "-nostdin", "-loglevel", "error", "-y", "-i", sub,
+                    "-filter_complex", "[0:0]showinfo[s]", "-map", "[s]", "-fps_mode", "passthrough",
+                    new File(dir, "f%03d.png").getPath()).inheritIO().start().waitFor());
+        } catch (IOException noFfmpeg) {
+            return frames;
+        }
+        File[] pngs = dir.listFiles((d, name) -> name.endsWith(".png"));
+        Arrays.sort(pngs);
+        for (File f : pngs) frames.add(ImageIO.read(f));
+        assertFalse(frames.isEmpty(), "ffmpeg rendered no frame");
+        return frames;
     }
 
     /** A JVM with this one's options on event database `db`, running ReceiverChild. */
