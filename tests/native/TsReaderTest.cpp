@@ -192,22 +192,9 @@ TEST(TsReader, CanalPlusServiceComponentsAndDisplaySet) {
         EXPECT_EQ(got.compositionPageId, c["subtitling"][0]["composition_page_id"]);
         EXPECT_EQ(got.ancillaryPageId, c["subtitling"][0]["ancillary_page_id"]);
     }
-    // The one display set: its placements and region sizes as its segments give them.
+    // The one display set, at its PTS (what it shows is the decoder's own test's business).
     ASSERT_EQ(s->subtitles.size(), 1u);
     const DisplaySet& set = s->subtitles[0];
-    std::vector<std::tuple<int, int, int>> placed, want;
-    std::map<int, std::pair<int, int>> sizes, wantSizes;
-    for (const RegionRef& r : set.placements) placed.push_back({r.id, r.x, r.y});
-    for (const Region& r : set.regions) sizes[r.id] = {r.width, r.height};
-    for (const json& seg : t["dvb_subtitles"][1]["pes"][0]["segments"]) {
-        if (seg["name"] == "page_composition") {
-            for (const json& r : seg["regions"]) want.push_back({r["region_id"], r["x"], r["y"]});
-        }
-        if (seg["name"] == "region_composition")
-            wantSizes[seg["region_id"]] = {seg["width"], seg["height"]};
-    }
-    EXPECT_EQ(placed, want);
-    EXPECT_EQ(sizes, wantSizes);
     EXPECT_EQ(set.pts, t["dvb_subtitles"][1]["pes"][0]["pts"]);
     EXPECT_GT(set.time, 0);
     EXPECT_LT(set.time, l.b.loopMillis);
