@@ -292,7 +292,9 @@ thread_local Reader* tReader = nullptr;  // the reader whose packets libdvbpsi i
 // reader that pushes packets sets tReader around every push instead.
 class Reader {
 public:
-    explicit Reader(TsReadStats& stats) : stats_(stats) {}
+    explicit Reader(TsReadStats& stats) : stats_(stats) {
+        for (uint16_t pid : {kPidPat, kPidNit, kPidSdt, kPidEit, kPidTdt}) sectionPid_[pid] = true;
+    }
     ~Reader() {
         if (pat_ != nullptr) dvbpsi_pat_detach(pat_), dvbpsi_delete(pat_);
         for (dvbpsi_t* h : {nit_, sdt_, eit_, tdt_}) {
@@ -704,6 +706,12 @@ void Reader::packet(const uint8_t* p) {
         return;
     }
     if (pid == 0x1FFF) return;
+    // A PID that carries no sections and is not the one timing the capture is skipped here,
+    // unless it may be the first with a PCR (an adaptation field) or a PTS (a payload start)
+    // while the capture has none yet: nobody reads its packets, so neither are its counters.
+    if (!sectionPid_[pid] && pid != pcrPid_ && pid != ptsPid_ && !(pcrPid_ < 0 && (p[3] & 0x20)) &&
+        !(ptsPid_ < 0 && (p[1] & 0x40)))
+        return;
     const bool payload = p[3] & 0x10, adaptation = p[3] & 0x20;
     const bool discontinuity = adaptation && p[4] > 0 && (p[5] & 0x80);
     const int cc = p[3] & 0x0F;
