@@ -180,6 +180,13 @@ struct TeletextPage {
     uint8_t charset = kNoCharset;
 };
 
+// An EIT schedule section as a broadcast carried it for a service: its table (0x50..0x6F),
+// number and version, and the events it listed, by id (Service::events holds them).
+struct EitSection {
+    uint8_t tableId = 0x50, number = 0, version = 0;
+    std::vector<uint16_t> events;
+};
+
 struct Service {
     uint16_t id = 0;
     uint8_t type = 1;  // EN 300 468 table 87: 1 television, 2 radio, 0x19 HD television ...
@@ -190,9 +197,10 @@ struct Service {
     std::vector<uint16_t> caSystems;  // CA system ids
     uint16_t pmtPid = 0, pcrPid = 0x1FFF;
     std::vector<Component> components;
-    std::vector<Event> events;           // by start time; the clock tells present and following
-    std::vector<DisplaySet> subtitles;   // of its subtitle components, in time order
-    std::vector<TeletextPage> teletext;  // of its teletext component, in time order
+    std::vector<Event> events;            // by start time; the clock tells present and following
+    std::vector<EitSection> eitSections;  // as received, where a capture carried a schedule
+    std::vector<DisplaySet> subtitles;    // of its subtitle components, in time order
+    std::vector<TeletextPage> teletext;   // of its teletext component, in time order
 };
 
 struct Transport {

@@ -375,6 +375,10 @@ private:
     std::map<Key3, Lcn> lcns_;
     std::map<Key3, std::map<uint16_t, Event>> events_;  // by service, by event id
     std::map<uint64_t, uint8_t> eitVersions_;           // by table, service, transport, section
+    // The schedule sections as received, by service, by table << 8 | number; and the number
+    // and version of the section being decoded (libdvbpsi is handed each as section 0).
+    std::map<Key3, std::map<uint16_t, EitSection>> eitSections_;
+    uint8_t eitNumber_ = 0, eitVersion_ = 0;
 
     int64_t firstUtc_ = 0, lastUtc_ = 0;
     int pcrPid_ = -1, ptsPid_ = -1;
@@ -560,6 +564,12 @@ void Reader::onSdt(void* data, dvbpsi_sdt_t* sdt) {
 void Reader::onEit(void* data, dvbpsi_eit_t* eit) {
     auto* r = static_cast<Reader*>(data);
     auto& events = r->events_[{eit->i_network_id, eit->i_ts_id, eit->i_extension}];
+    EitSection* section = nullptr;
+    if (eit->i_table_id >= 0x50) {
+        section = &r->eitSections_[{eit->i_network_id, eit->i_ts_id, eit->i_extension}]
+                                  [eit->i_table_id << 8 | r->eitNumber_];
+        *section = {eit->i_table_id, r->eitNumber_, r->eitVersion_, {}};
+    }
     for (auto* ev = eit->p_first_event; ev != nullptr; ev = ev->p_next) {
         const int64_t start = mjdUtc(ev->i_start_time), duration = bcdSeconds(ev->i_duration);
         if (start < 0 || duration < 0) {
@@ -616,6 +626,7 @@ void Reader::onEit(void* data, dvbpsi_eit_t* eit) {
             }
             appendText(e.extendedText, x->i_text, x->i_text_length);
         }
+        if (section != nullptr) section->events.push_back(e.id);
         events[e.id] = std::move(e);
     }
     dvbpsi_eit_delete(eit);
@@ -765,6 +776,8 @@ void Reader::eitSection(const uint8_t* s, size_t n) {
     auto seen = eitVersions_.find(key);
     if (seen != eitVersions_.end() && seen->second == version) return;
     eitVersions_[key] = version;
+    eitNumber_ = s[6];
+    eitVersion_ = version;
     uint8_t one[4096];  // a section is at most 4096 bytes, its length field at most 4095 + 3
     memcpy(one, s, n);
     one[6] = one[7] = one[12] = 0;
@@ -1012,6 +1025,11 @@ void Reader::build(TsCapture& out) {
             for (Service& s : tr.services) {
                 auto lcn = lcns_.find({tr.onid, tr.tsid, s.id});
                 if (lcn != lcns_.end()) s.lcn = lcn->second.number, s.visible = lcn->second.visible;
+                auto sections = eitSections_.find({tr.onid, tr.tsid, s.id});
+                if (sections != eitSections_.end()) {
+                    for (auto& [at, section] : sections->second)
+                        s.eitSections.push_back(std::move(section));
+                }
                 auto ev = events_.find({tr.onid, tr.tsid, s.id});
                 if (ev == events_.end()) continue;
                 for (auto& [id, e] : ev->second) s.events.push_back(std::move(e));

@@ -2,6 +2,7 @@
 // in it, and storing their schedules from the broadcast, all on the service thread. Module
 // operations only change the list and ask for a sync; they never write the database.
 #include <broadcast/DvbText.h>
+#include <algorithm>
 
 #include "Receiver.h"
 
@@ -76,6 +77,27 @@ std::array<ScheduleSection, kEpgDays> scheduleSections(const dvbmodel::Service& 
 ScheduleStore storeSchedule(EpgDatabase& db, ServiceKey key, const dvbmodel::Service& service,
                             int64_t today) {
     ScheduleStore out;
+    if (!service.eitSections.empty()) {
+        // A captured schedule goes in as it was received: its own sections and versions, so
+        // that a new version replaces the events of that section and nothing else.
+        std::vector<const dvbmodel::Event*> events;
+        for (const dvbmodel::EitSection& s : service.eitSections) {
+            if (db.holds(key, s.tableId, s.number, s.version)) continue;
+            events.clear();
+            for (uint16_t id : s.events) {
+                auto e = std::find_if(service.events.begin(), service.events.end(),
+                                      [id](const dvbmodel::Event& x) { return x.id == id; });
+                if (e != service.events.end()) events.push_back(&*e);
+            }
+            if (!db.storeSection(key, s.tableId, s.number, s.version, events)) {
+                out.failed = true;
+                break;
+            }
+            ++out.sections;
+            out.events += static_cast<int>(events.size());
+        }
+        return out;
+    }
     for (const ScheduleSection& s : scheduleSections(service, today)) {
         if (db.holds(key, s.tableId, s.number, s.version)) continue;
         if (!db.storeSection(key, s.tableId, s.number, s.version, s.events)) {

@@ -148,6 +148,16 @@ TEST(TsReader, FrenchMultiplexMatchesItsTruth) {
             check(svc, e, utc("1970-01-01T" + e["duration"].get<std::string>() + "Z"),
                   e["name_hex"], e["text_utf8"], e["extended_text_utf8"]);
         }
+        // The schedule's sections as received, each with the events it listed.
+        std::set<std::pair<int, int>> want, got;
+        for (const auto& [table, numbers] : svc["sections_seen"].items())
+            for (int n : numbers) want.insert({std::stoi(table, nullptr, 16), n});
+        size_t listed = 0;
+        for (const EitSection& e :
+             l.services.at({svc["onid"], svc["tsid"], svc["sid"]})->eitSections)
+            got.insert({e.tableId, e.number}), listed += e.events.size();
+        EXPECT_EQ(got, want) << name;
+        EXPECT_GE(listed, svc["unique_event_count"].get<size_t>()) << name;
     }
     for (const auto& [s, set] : ids) EXPECT_EQ(s->events.size(), set.size()) << s->id;
     // A clean capture: nothing dropped but the one EIT section whose CRC fails.
