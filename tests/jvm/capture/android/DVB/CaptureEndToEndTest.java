@@ -98,9 +98,16 @@ class CaptureEndToEndTest {
                     List.of("" + info.svcType, hex(info.svcName, info.svcName.length), "" + info.lcn));
         }
         assertEquals(5, actual);
-        Scnm.SCNM_ServiceInfo canal = found.get(1 << 16 | Integer.parseInt(firstGroup(truth("dvbsub-canalplus-cinema"),
-                "\"sid\": (\\d+)")));
-        assertEquals("CANAL+ CINEMA", new String(canal.svcName, StandardCharsets.ISO_8859_1).trim());
+        // The other captures' services, by the name bytes their SDT broadcast (the damaged one's
+        // onid reads 0).
+        for (String capture : new String[] {"dvbsub-canalplus-cinema", "damaged-subtitles-teletext"}) {
+            Matcher s = Pattern.compile("\\{\"sid\": (\\d+), [^{]*?\"name_hex\": \"(\\w*)\"")
+                    .matcher(truth(capture).substring(truth(capture).indexOf("\"services_summary\"")));
+            assertTrue(s.find(), capture);
+            int sid = Integer.parseInt(s.group(1));
+            assertTrue(found.values().stream().anyMatch(i -> i.svcId == sid
+                    && hex(i.svcName, i.svcName.length).equals(s.group(2))), capture + " service " + sid);
+        }
     }
 
     static String firstGroup(String text, String regex) {
