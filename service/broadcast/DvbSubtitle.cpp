@@ -155,11 +155,7 @@ void DvbSubtitleDecoder::feed(const uint8_t* p, size_t size, std::vector<Display
         return;
     }
     // The PTS is taken even where a bit error broke its marker bits.
-    if ((p[7] & 0x80) && p[8] >= 5) {
-        const uint8_t* t = p + 9;
-        pts_ = uint64_t{(t[0] >> 1) & 7u} << 30 | uint64_t{t[1]} << 22 |
-               (uint64_t{t[2]} >> 1) << 15 | uint64_t{t[3]} << 7 | uint64_t{t[4]} >> 1;
-    }
+    if ((p[7] & 0x80) && p[8] >= 5) pts_ = readPts(p + 9);
     pos += 2;
     while (pos < end && p[pos] != 0xFF) {
         if (p[pos] != 0x0F || pos + 6 > end) {
@@ -714,12 +710,23 @@ bool same(const ClutEntry& a, const ClutEntry& b) {
 
 }  // namespace
 
+uint64_t readPts(const uint8_t* t) {
+    return uint64_t{(t[0] >> 1) & 7u} << 30 | uint64_t{t[1]} << 22 | (uint64_t{t[2]} >> 1) << 15 |
+           uint64_t{t[3]} << 7 | uint64_t{t[4]} >> 1;
+}
+
+void writePts(uint8_t* p, uint64_t pts) {
+    p[0] = static_cast<uint8_t>(0x21 | ((pts >> 29) & 0x0E));
+    p[1] = static_cast<uint8_t>(pts >> 22);
+    p[2] = static_cast<uint8_t>(pts >> 14 | 1);
+    p[3] = static_cast<uint8_t>(pts >> 7);
+    p[4] = static_cast<uint8_t>(pts << 1 | 1);
+}
+
 std::vector<uint8_t> encodeDisplaySet(const DisplaySet& set, uint16_t pageId, uint64_t pts) {
-    std::vector<uint8_t> out = {0x00, 0x00, 0x01, 0xBD, 0, 0, 0x84, 0x80, 5};
-    out.insert(out.end(), {static_cast<uint8_t>(0x21 | ((pts >> 29) & 0x0E)),
-                           static_cast<uint8_t>(pts >> 22), static_cast<uint8_t>(pts >> 14 | 1),
-                           static_cast<uint8_t>(pts >> 7), static_cast<uint8_t>(pts << 1 | 1)});
-    out.insert(out.end(), {0x20, 0x00});
+    std::vector<uint8_t> out = {0x00, 0x00, 0x01, 0xBD, 0, 0, 0x84, 0x80,
+                                5,    0,    0,    0,    0, 0, 0x20, 0x00};
+    writePts(out.data() + 9, pts);
     bool fits = true;
     size_t at;
     if (set.hasDisplay) {

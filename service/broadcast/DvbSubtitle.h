@@ -101,6 +101,11 @@ private:
 // or the PES over 65535 bytes) gives an empty result.
 std::vector<uint8_t> encodeDisplaySet(const DisplaySet& set, uint16_t pageId, uint64_t pts);
 
+// A PES header's 33-bit time stamp from its 5 bytes (marker bits not checked: a bit error in
+// one leaves the time), and the 5 bytes of `pts` as a PTS-only header writes them ('0010').
+uint64_t readPts(const uint8_t* five);
+void writePts(uint8_t* five, uint64_t pts);
+
 // The PES packets of one PID, reassembled from 188-byte transport packets. A packet lost on
 // the way (continuity counter) or a transport error drops the PES being assembled.
 class PesAssembler {

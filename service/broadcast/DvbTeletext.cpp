@@ -1,5 +1,7 @@
 #include "broadcast/DvbTeletext.h"
 
+#include "broadcast/DvbSubtitle.h"
+
 #include <libzvbi.h>
 
 #include <algorithm>
@@ -183,10 +185,8 @@ std::vector<uint8_t> encodeTeletextPes(const TeletextPage* pages, size_t count, 
     std::vector<uint8_t> pes;
     pes.reserve(total);
     pes.insert(pes.end(), {0, 0, 1, 0xBD, static_cast<uint8_t>((total - 6) >> 8),
-                           static_cast<uint8_t>(total - 6), 0x84, 0x80, 0x24,
-                           static_cast<uint8_t>(0x21 | (pts >> 29 & 0x0E)),
-                           static_cast<uint8_t>(pts >> 22), static_cast<uint8_t>(pts >> 14 | 1),
-                           static_cast<uint8_t>(pts >> 7), static_cast<uint8_t>(pts << 1 | 1)});
+                           static_cast<uint8_t>(total - 6), 0x84, 0x80, 0x24, 0, 0, 0, 0, 0});
+    writePts(pes.data() + 9, pts);
     pes.resize(kPesHeaderSize, kStuffing);
     pes.push_back(kDataIdentifier);
     size_t sent = 0;

@@ -702,8 +702,7 @@ void Reader::timing(const uint8_t* p, uint16_t pid, bool payload, bool start, si
     if (!payload || !start || offset + 14 > kPacket) return;
     const uint8_t* pes = p + offset;
     if (pes[0] != 0 || pes[1] != 0 || pes[2] != 1 || (pes[7] & 0x80) == 0) return;
-    const uint64_t pts = uint64_t(pes[9] >> 1 & 7) << 30 | uint64_t(pes[10]) << 22 |
-                         uint64_t(pes[11] >> 1) << 15 | uint64_t(pes[12]) << 7 | pes[13] >> 1;
+    const uint64_t pts = readPts(pes + 9);
     if (ptsPid_ < 0) ptsPid_ = pid, firstPts_ = minPts_ = maxPts_ = pts;
     if (pid == ptsPid_) minPts_ = std::min(minPts_, pts), maxPts_ = std::max(maxPts_, pts);
 }
@@ -852,10 +851,7 @@ void Reader::timedContent(const uint8_t* d, size_t begin, size_t size) {
     auto deliver = [&](Stream& st) {
         for (const std::vector<uint8_t>& one : pes) {
             int64_t ms = 0;
-            if (one.size() >= 14 && (one[7] & 0x80)) {
-                ms = msOf(uint64_t(one[9] >> 1 & 7) << 30 | uint64_t(one[10]) << 22 |
-                          uint64_t(one[11] >> 1) << 15 | uint64_t(one[12]) << 7 | one[13] >> 1);
-            }
+            if (one.size() >= 14 && (one[7] & 0x80)) ms = msOf(readPts(one.data() + 9));
             if (st.subtitles) {
                 const size_t from = st.service->subtitles.size();
                 st.subtitles->feed(one.data(), one.size(), st.service->subtitles);

@@ -157,14 +157,6 @@ uint8_t* packetHeader(std::vector<uint8_t>& out, uint16_t pid, bool start, uint8
     return p + 4;
 }
 
-void putPts(uint8_t* p, uint64_t pts) {
-    p[0] = static_cast<uint8_t>(0x21 | ((pts >> 29) & 0x0E));
-    p[1] = static_cast<uint8_t>(pts >> 22);
-    p[2] = static_cast<uint8_t>(pts >> 14 | 1);
-    p[3] = static_cast<uint8_t>(pts >> 7);
-    p[4] = static_cast<uint8_t>(pts << 1 | 1);
-}
-
 const Event* eventAt(const Service& svc, int64_t seconds) {
     const Event* found = nullptr;
     for (const auto& e : svc.events) {
@@ -870,7 +862,7 @@ void TsWriter::pes(uint16_t pid, uint8_t streamId, uint64_t pts, size_t payload,
     // The PES header with its PTS, then what the payload starts with; the rest of the payload
     // is one filler byte, written straight into the packets.
     uint8_t head[32] = {0x00, 0x00, 0x01, streamId, 0, 0, 0x84, 0x80, 5};
-    putPts(head + 9, pts);
+    writePts(head + 9, pts);
     size_t length = 8 + payload, headLen = 14;
     // Video PES longer than the length field holds say 0: unbounded.
     if (length <= 0xFFFF)

@@ -30,8 +30,7 @@ struct Capture {
 
 uint64_t pts(const std::vector<uint8_t>& p) {
     if (p.size() < 14 || !(p[7] & 0x80)) return 0;
-    return uint64_t{p[9] & 0x0Eu} << 29 | p[10] << 22 | (p[11] >> 1) << 15 | p[12] << 7 |
-           p[13] >> 1;
+    return readPts(p.data() + 9);
 }
 
 const Capture& capture() {

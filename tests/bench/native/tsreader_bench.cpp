@@ -159,17 +159,6 @@ void BM_SubtitleDecode(benchmark::State& state) {
             sets / seconds / (double(sets) / state.iterations() / (c.durationMs / 1000.0));
 }
 
-uint64_t ptsOf(const std::vector<uint8_t>& p) {
-    return uint64_t(p[9] >> 1 & 7) << 30 | uint64_t(p[10]) << 22 | uint64_t(p[11] >> 1) << 15 |
-           uint64_t(p[12]) << 7 | p[13] >> 1;
-}
-
-void setPts(std::vector<uint8_t>& p, uint64_t pts) {
-    p[9] = uint8_t((p[9] & 0xF1) | (pts >> 29 & 0x0E));
-    p[10] = uint8_t(pts >> 22), p[11] = uint8_t((pts >> 14 & 0xFE) | 1);
-    p[12] = uint8_t(pts >> 7), p[13] = uint8_t((pts << 1 & 0xFE) | 1);
-}
-
 void BM_SubtitleVsFfmpeg(benchmark::State& state) {
     constexpr int kRepeats = 1000;
     std::ifstream in(DVB_TESTDATA_DIR "/dvbsub-canalplus-cinema.ts", std::ios::binary);
@@ -192,7 +181,8 @@ void BM_SubtitleVsFfmpeg(benchmark::State& state) {
     for (int k = 0; k < kRepeats; ++k) {
         for (auto p : pes) {
             if (p.size() < 14 || !(p[7] & 0x80)) continue;
-            setPts(p, (ptsOf(p) + uint64_t(k) * 270000) & ((uint64_t{1} << 33) - 1));
+            writePts(p.data() + 9,
+                     (readPts(p.data() + 9) + uint64_t(k) * 270000) & ((uint64_t{1} << 33) - 1));
             packetizePes(0x0157, p, cc, ts);
             repeated.push_back(std::move(p));
         }
