@@ -173,22 +173,16 @@ class ReceiverEndToEndTest {
         Strm.SubtitleContent sc = new Strm.SubtitleContent();
         dvb.getStrm().Strm_GetSubTilteStreamInfo(0, sc);
         Subttl sub = dvb.getSubttl();
-        Subttl.SUBTTL_Settings s = new Subttl.SUBTTL_Settings();
-        s.pid = sc.pid;
-        s.langCode = sc.langCode;
-        s.compositionPageId = sc.compositionPageId;
-        s.ancillaryPageId = sc.ancillaryPageId;
-        s.hstrm = stream;
         // A dump of the transponder runs meanwhile, for ffmpeg to render its subtitles.
         File dump = new File(EPG_DB.getParent(), "e2e-dump.ts");
         assertEquals(0, dvb.getCfg().Cfg_TSDumpStart(0, 0, 0, dump.getPath()));
-        long decoder = sub.Subttl_Start(s);
+        long decoder = Compose.start(sub, sc, stream);
         next(240); // the display set on the air at the start, sent before the dump began
         while (next(240).get(2) == 0) continue;
         Subttl.SUBTTL_Data_t data = new Subttl.SUBTTL_Data_t();
         assertEquals(0, sub.Subttl_GetData(decoder, data));
         assertTrue(data.numRegions > 0 && data.numCluts > 0);
-        BufferedImage shown = Compose.displaySet(sub, data, 720, 576);
+        BufferedImage shown = dvbdemo.DisplaySetImage.compose(sub, data);
         Thread.sleep(200);
         assertEquals(0, dvb.getCfg().Cfg_TSDumpStop());
         List<Integer> differing = ffmpegFrames(dump, sc.pid).stream().map(f -> Compose.differing(f, shown))
