@@ -187,6 +187,42 @@ struct EitSection {
     std::vector<uint16_t> events;
 };
 
+// What the rows and control bits of a TeletextPage hold, at level 1.
+namespace ttx {
+// Spacing attributes: alphanumeric colours 0x01..0x07, mosaic colours 0x11..0x17, and these.
+enum : uint8_t {
+    kRed = 0x01,
+    kGreen = 0x02,
+    kYellow = 0x03,
+    kBlue = 0x04,
+    kMagenta = 0x05,
+    kCyan = 0x06,
+    kWhite = 0x07,
+    kFlash = 0x08,
+    kSteady = 0x09,
+    kEndBox = 0x0A,
+    kStartBox = 0x0B,
+    kNormalSize = 0x0C,
+    kDoubleHeight = 0x0D,
+    kMosaicRed = 0x11,
+    kMosaicGreen = 0x12,
+    kMosaicYellow = 0x13,
+    kMosaicBlue = 0x14,
+    kMosaicCyan = 0x16,
+    kMosaicWhite = 0x17,
+    kConceal = 0x18,
+    kContiguous = 0x19,
+    kSeparated = 0x1A,
+    kBlackBackground = 0x1C,
+    kNewBackground = 0x1D,
+    kHold = 0x1E,
+    kRelease = 0x1F,
+};
+// Control bits C4..C7 and C11 as TeletextPage::controlBits holds them.
+constexpr uint16_t kErasePage = 1 << 4, kNewsflash = 1 << 5, kSubtitle = 1 << 6,
+                   kSuppressHeader = 1 << 7, kSerial = 1 << 11;
+}  // namespace ttx
+
 struct Service {
     uint16_t id = 0;
     uint8_t type = 1;  // EN 300 468 table 87: 1 television, 2 radio, 0x19 HD television ...

@@ -14,36 +14,8 @@ namespace dvbmodel::builtin {
 
 namespace {
 
-// Spacing attributes (level 1).
-enum : uint8_t {
-    kRed = 0x01,
-    kGreen = 0x02,
-    kYellow = 0x03,
-    kBlue = 0x04,
-    kMagenta = 0x05,
-    kCyan = 0x06,
-    kWhite = 0x07,
-    kFlash = 0x08,
-    kSteady = 0x09,
-    kEndBox = 0x0A,
-    kStartBox = 0x0B,
-    kNormalSize = 0x0C,
-    kDoubleHeight = 0x0D,
-    kMosaicRed = 0x11,
-    kMosaicGreen = 0x12,
-    kMosaicYellow = 0x13,
-    kMosaicBlue = 0x14,
-    kMosaicCyan = 0x16,
-    kMosaicWhite = 0x17,
-    kContiguous = 0x19,
-    kSeparated = 0x1A,
-    kBlackBackground = 0x1C,
-    kNewBackground = 0x1D,
-};
+using namespace ttx;
 
-// Control bits, as TeletextPage::controlBits holds them.
-constexpr uint16_t kErasePage = 1 << 4, kNewsflash = 1 << 5, kSubtitle = 1 << 6,
-                   kSuppressHeader = 1 << 7;
 // C12..C14 = 0 0 1: the German subset of the Latin G0 set.
 constexpr uint16_t kGermanOption = 1 << 14;
 

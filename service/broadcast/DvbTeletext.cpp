@@ -18,7 +18,6 @@ constexpr uint8_t kUnitTeletext = 0x02, kUnitSubtitle = 0x03;
 // PES header of EN 300 472: header data length 0x24, so the data start 45 bytes in.
 constexpr size_t kPesHeaderSize = 45;
 constexpr uint8_t kDataIdentifier = 0x10;
-constexpr uint16_t kSerialBit = 1 << 11, kSubtitleBit = 1 << 6;
 
 // The magazine of a page number in the 3 bits that packets carry (8 travels as 0).
 int magazineBits(uint16_t number) {
@@ -152,7 +151,7 @@ void TeletextDecoder::header(int mag, const uint8_t* p, int64_t timeMs,
     }
     uint16_t control =
             static_cast<uint16_t>((f[3] >> 3) << 4 | (f[5] >> 2) << 5 | f[6] << 7 | f[7] << 11);
-    if (control & kSerialBit) {
+    if (control & ttx::kSerial) {
         for (Magazine& other : magazines_) complete(other, out);
     } else {
         complete(m, out);
@@ -194,7 +193,7 @@ std::vector<uint8_t> encodeTeletextPes(const TeletextPage* pages, size_t count, 
     for (size_t i = 0; i < count; ++i) {
         const TeletextPage& page = pages[i];
         const int mag = magazineBits(page.number);
-        const uint8_t unitId = page.controlBits & kSubtitleBit ? kUnitSubtitle : kUnitTeletext;
+        const uint8_t unitId = page.controlBits & ttx::kSubtitle ? kUnitSubtitle : kUnitTeletext;
         uint8_t p[kPacketSize];
         auto send = [&](int row) {
             p[0] = vbi_ham8(mag | (row & 1) << 3);

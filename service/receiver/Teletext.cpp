@@ -1,5 +1,7 @@
 #include "Teletext.h"
 
+#include "broadcast/Broadcast.h"
+
 namespace dvbrx {
 namespace {
 
@@ -25,22 +27,7 @@ constexpr char32_t kNationalSubsets[7][13] = {
         {U'#', U'ů', U'č', U'ť', U'ž', U'ý', U'í', U'ř', U'é', U'á', U'ě', U'ú', U'š'},
 };
 
-// Spacing attributes of level 1.
-enum : uint8_t {
-    kFlash = 0x08,
-    kSteady = 0x09,
-    kEndBox = 0x0A,
-    kStartBox = 0x0B,
-    kNormalSize = 0x0C,
-    kDoubleHeight = 0x0D,
-    kConceal = 0x18,
-    kContiguous = 0x19,
-    kSeparated = 0x1A,
-    kBlackBackground = 0x1C,
-    kNewBackground = 0x1D,
-    kHold = 0x1E,
-    kRelease = 0x1F,
-};
+using namespace dvbmodel::ttx;
 
 // What the attributes of a row have set so far, from the defaults at its start.
 struct RowState {
