@@ -8,8 +8,10 @@
 #include <receiver/EpgDatabase.h>
 
 #include <benchmark/benchmark.h>
+
 #include <sqlite3.h>
 #include <unistd.h>
+#include "BenchSupport.h"
 
 #include <cstdio>
 #include <filesystem>
@@ -17,6 +19,9 @@
 #include <random>
 
 namespace {
+
+using bench::folder;
+using bench::removeDatabase;
 
 using dvbmodel::Event;
 using dvbrx::EpgDatabase;
@@ -74,19 +79,6 @@ size_t eventTotal() {
     size_t n = 0;
     for (const Section& s : schedule()) n += s.events.size();
     return n;
-}
-
-std::string folder() {
-    static const std::string dir = [] {
-        std::string tmpl = std::filesystem::temp_directory_path().string() + "/epg-bench-XXXXXX";
-        if (!mkdtemp(tmpl.data())) std::abort();
-        return tmpl;
-    }();
-    return dir;
-}
-
-void removeDatabase(const std::string& path) {
-    for (const char* suffix : {"", "-wal", "-shm"}) std::filesystem::remove(path + suffix);
 }
 
 std::unique_ptr<EpgDatabase> openOrDie(const std::string& path) {
@@ -280,30 +272,11 @@ BENCHMARK(BM_BareInsert)->Unit(benchmark::kMillisecond)->Iterations(1)->Repetiti
 BENCHMARK(BM_EventAt)->Repetitions(3);
 BENCHMARK(BM_BareQuery)->Repetitions(3);
 
-// Keeps the median real time of each benchmark besides printing the usual table.
-class Medians : public benchmark::ConsoleReporter {
-public:
-    Medians() : ConsoleReporter(isatty(STDOUT_FILENO) ? OO_ColorTabular : OO_Tabular) {}
-    void ReportRuns(const std::vector<Run>& runs) override {
-        for (const Run& r : runs) {
-            if (r.run_type == Run::RT_Aggregate && r.aggregate_name == "median") {
-                median[r.run_name.function_name] = {r.GetAdjustedRealTime(),
-                                                    r.GetAdjustedCPUTime()};
-            }
-        }
-        ConsoleReporter::ReportRuns(runs);
-    }
-    struct Times {
-        double real, cpu;
-    };
-    std::map<std::string, Times> median;
-};
-
 }  // namespace
 
 int main(int argc, char** argv) {
     benchmark::Initialize(&argc, argv);
-    Medians reporter;
+    bench::Medians reporter;
     benchmark::RunSpecifiedBenchmarks(&reporter);
     auto& m = reporter.median;
     std::printf("\n%zu events in %zu sections, %d services x %d days\n", eventTotal(),

@@ -22,8 +22,10 @@
 #include <receiver/Recording.h>
 
 #include <benchmark/benchmark.h>
+
 #include <sqlite3.h>
 #include <unistd.h>
+#include "BenchSupport.h"
 
 #include <algorithm>
 #include <chrono>
@@ -37,6 +39,9 @@
 #include <random>
 
 namespace {
+
+using bench::folder;
+using bench::removeDatabase;
 
 using dvbrx::Receiver;
 using dvbrx::ServiceKey;
@@ -54,19 +59,6 @@ long rssKiB() {
         if (line.rfind("VmRSS:", 0) == 0) return std::strtol(line.c_str() + 6, nullptr, 10);
     }
     return -1;
-}
-
-std::string folder() {
-    static const std::string dir = [] {
-        std::string tmpl = std::filesystem::temp_directory_path().string() + "/rx-bench-XXXXXX";
-        if (!mkdtemp(tmpl.data())) std::abort();
-        return tmpl;
-    }();
-    return dir;
-}
-
-void removeDatabase(const std::string& path) {
-    for (const char* suffix : {"", "-wal", "-shm"}) std::filesystem::remove(path + suffix);
 }
 
 // The built-in broadcast grown to 100 services: copies of its services under new ids on its
@@ -388,25 +380,6 @@ BENCHMARK(BM_BareInsert)
 BENCHMARK(BM_EpgGetEvent)->Repetitions(3);
 BENCHMARK(BM_BareQuery)->Repetitions(3);
 
-// Keeps the median times of each benchmark besides printing the usual table.
-class Medians : public benchmark::ConsoleReporter {
-public:
-    Medians() : ConsoleReporter(isatty(STDOUT_FILENO) ? OO_ColorTabular : OO_Tabular) {}
-    void ReportRuns(const std::vector<Run>& runs) override {
-        for (const Run& r : runs) {
-            if (r.run_type == Run::RT_Aggregate && r.aggregate_name == "median") {
-                median[r.run_name.function_name] = {r.GetAdjustedRealTime(),
-                                                    r.GetAdjustedCPUTime()};
-            }
-        }
-        ConsoleReporter::ReportRuns(runs);
-    }
-    struct Times {
-        double real, cpu;
-    };
-    std::map<std::string, Times> median;
-};
-
 ANT_FrontendParameters band(int32_t type, int16_t orbital) {
     ANT_FrontendParameters p{};
     p.type = type;
@@ -480,7 +453,7 @@ int main(int argc, char** argv) {
     }
     fullScan();
     std::printf("\n");
-    Medians reporter;
+    bench::Medians reporter;
     benchmark::RunSpecifiedBenchmarks(&reporter);
     auto& m = reporter.median;
     std::printf("\n%zu events of %d services x 7 days\n", gEvents, kServices);
