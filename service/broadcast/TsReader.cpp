@@ -347,6 +347,16 @@ private:
     static void onTot(void* data, dvbpsi_tot_t* tot);
 
     void packet(const uint8_t* p);
+    // A packet without transport error of a PID that carries no sections and is not the one
+    // timing the capture is skipped, unless it may be the first with a PCR (an adaptation
+    // field) or a PTS (a payload start) while the capture has none yet: nobody reads its
+    // packets, so neither are its counters. The read loop asks this before anything else.
+    bool unread(const uint8_t* p) const {
+        const uint16_t pid = (p[1] & 0x1F) << 8 | p[2];
+        return !(p[1] & 0x80) && !sectionPid_[pid] && pid != pcrPid_ && pid != ptsPid_ &&
+               !(pcrPid_ < 0 && (p[3] & 0x20)) &&
+               !(ptsPid_ < 0 && (p[1] & 0x40) && notPes_[pid] < kNotPes);
+    }
     void push(dvbpsi_t* h, uint16_t pid, const uint8_t* s, size_t n);
     void eitSection(const uint8_t* s, size_t n);
     void timing(const uint8_t* p, uint16_t pid, bool payload, bool start, size_t offset);
@@ -360,6 +370,8 @@ private:
     // stops at this look-up.
     std::array<bool, 8192> sectionPid_{};
     std::array<int8_t, 8192> continuity_{};
+    static constexpr uint8_t kNotPes = 8;
+    std::array<uint8_t, 8192> notPes_{};  // payload starts without a PES start code, to kNotPes
     std::map<uint16_t, SectionAssembler> sections_;  // of the SI and PMT PIDs
     std::map<uint16_t, uint8_t> pushed_;             // continuity of the packets pushed
 
@@ -701,7 +713,14 @@ void Reader::timing(const uint8_t* p, uint16_t pid, bool payload, bool start, si
     }
     if (!payload || !start || offset + 14 > kPacket) return;
     const uint8_t* pes = p + offset;
-    if (pes[0] != 0 || pes[1] != 0 || pes[2] != 1 || (pes[7] & 0x80) == 0) return;
+    if (pes[0] != 0 || pes[1] != 0 || pes[2] != 1) {
+        // A PID carries sections or PES, never both: after a few payload starts without a PES
+        // start code (more than a damaged packet or two gives), its packets are no longer
+        // looked at for a PTS.
+        if (notPes_[pid] < kNotPes) ++notPes_[pid];
+        return;
+    }
+    if ((pes[7] & 0x80) == 0) return;
     const uint64_t pts = readPts(pes + 9);
     if (ptsPid_ < 0) ptsPid_ = pid, firstPts_ = minPts_ = maxPts_ = pts;
     if (pid == ptsPid_) minPts_ = std::min(minPts_, pts), maxPts_ = std::max(maxPts_, pts);
@@ -715,13 +734,7 @@ void Reader::packet(const uint8_t* p) {
         continuity_[pid] = -1;
         return;
     }
-    if (pid == 0x1FFF) return;
-    // A PID that carries no sections and is not the one timing the capture is skipped here,
-    // unless it may be the first with a PCR (an adaptation field) or a PTS (a payload start)
-    // while the capture has none yet: nobody reads its packets, so neither are its counters.
-    if (!sectionPid_[pid] && pid != pcrPid_ && pid != ptsPid_ && !(pcrPid_ < 0 && (p[3] & 0x20)) &&
-        !(ptsPid_ < 0 && (p[1] & 0x40)))
-        return;
+    if (pid == 0x1FFF || unread(p)) return;
     const bool payload = p[3] & 0x10, adaptation = p[3] & 0x20;
     const bool discontinuity = adaptation && p[4] > 0 && (p[5] & 0x80);
     const int cc = p[3] & 0x0F;
@@ -1069,15 +1082,22 @@ bool Reader::read(const uint8_t* d, size_t size, const std::string& name, TsCapt
         pat_ = nullptr;
     }
     nit_ = demux(), sdt_ = demux(), eit_ = demux(), tdt_ = demux();
+    uint64_t skipped = 0;
     for (size_t pos = begin; pos + kPacket <= size;) {
-        if (d[pos] != kSync) {
+        const uint8_t* p = d + pos;
+        if (p[0] != kSync) {
             ++stats_.syncLosses;
             pos = findSync(d, size, pos + 1);
             continue;
         }
-        packet(d + pos);
         pos += kPacket;
+        if (unread(p)) {
+            ++skipped;
+            continue;
+        }
+        packet(p);
     }
+    stats_.packets += skipped;
     timedContent(d, begin, size);
     build(out);
     tReader = nullptr;
