@@ -16,6 +16,7 @@ abstract class SpyTestBase {
     static final long LOW = (int) HANDLE;
     static final String GETTER = "2 SCNM getScnm was called";
     static final String NET_BEGIN = "2 SCNM +++android_dvb_Scnm_GetServiceList";
+    static final boolean WIDE = System.getProperty("sun.arch.data.model").equals("64");
 
     static {
         Spy.reset(); // loads the test library first
@@ -65,6 +66,15 @@ abstract class SpyTestBase {
         List<String> out = new ArrayList<>();
         for (int i = 0; i < Spy.callCount(); i++) out.add(Spy.op(i));
         return out;
+    }
+
+    /** The lines a call of `method` (of class `cls`) writes on entry, before it checks anything. */
+    static List<String> entryLines(String cls, String method) {
+        List<String> lines = new ArrayList<>();
+        if (method.equals("Scnm_GetNetworkList")) lines.add(NET_BEGIN);
+        if (cls.equals("Scnm")) lines.add(GETTER);
+        if (method.equals("Cfg_Reset")) lines.add("2 CFG android_dvb_Cfg_Reset was called");
+        return lines;
     }
 
     /** The only call the spy saw, which must be of `op`; returns its index. */
