@@ -21,9 +21,12 @@ class DvbTest extends SpyTestBase {
         return lines;
     }
 
+    /** The only live DVB object, which only the Java object holds, with the only listener. */
     static long onlyDvb() {
         long[] live = Spy.liveDvbs();
         assertEquals(1, live.length, "live DVB objects");
+        assertEquals(1, Spy.strongCount(live[0]), "the Java object's reference only");
+        assertEquals(1, Spy.liveListenerCount(), "an earlier listener went with its object");
         return live[0];
     }
 
@@ -54,16 +57,12 @@ class DvbTest extends SpyTestBase {
         assertEquals(List.of("new class", "new object"), List.of(Spy.takeGlobalRefEvents()));
         long first = onlyDvb();
         if (!WIDE) assertEquals(first, dvb.nativeContext() & 0xFFFFFFFFL);
-        assertEquals(1, Spy.strongCount(first), "the Java object's reference only");
-        assertEquals(1, Spy.liveListenerCount());
         int firstContext = dvb.nativeContext();
         Spy.takeLogs();
         call(dvb, "native_setup", new WeakReference<>(dvb)); // binds anew, drops the first
         long second = onlyDvb();
         assertNotEquals(first, second);
         assertNotEquals(firstContext, dvb.nativeContext());
-        assertEquals(1, Spy.strongCount(second));
-        assertEquals(1, Spy.liveListenerCount(), "the first listener went with its object");
         assertEquals(lines(second, "native_setup"), List.of(Spy.takeLogs()));
         Spy.takeGlobalRefEvents();
         dvb.release();

@@ -42,23 +42,18 @@ abstract class SpyTestBase {
         return call(d, "get" + cls);
     }
 
-    static Method method(Class<?> cls, String name) {
-        for (Method m : cls.getDeclaredMethods()) {
-            if (m.getName().equals(name)) {
-                m.setAccessible(true);
-                return m;
-            }
-        }
-        throw new AssertionError(cls.getSimpleName() + " has no " + name);
-    }
-
     /** Calls `name` on `target`, handing back what it threw as it threw it. */
     static Object call(Object target, String name, Object... args) throws Throwable {
-        try {
-            return method(target.getClass(), name).invoke(target, args);
-        } catch (InvocationTargetException e) {
-            throw e.getCause();
+        for (Method m : target.getClass().getDeclaredMethods()) {
+            if (!m.getName().equals(name)) continue;
+            m.setAccessible(true);
+            try {
+                return m.invoke(target, args);
+            } catch (InvocationTargetException e) {
+                throw e.getCause();
+            }
         }
+        throw new AssertionError(target.getClass().getSimpleName() + " has no " + name);
     }
 
     /** The calls the spy saw, one op name each. */
