@@ -86,7 +86,6 @@ class CacheTest extends SpyTestBase {
     @ParameterizedTest
     @MethodSource("readers")
     void anIndexOutsideItsRoomTouchesNothing(Reader r) throws Throwable {
-        int calls = 0;
         for (int p = 0; p < r.rooms.length; p++) {
             for (int bad : new int[] {-1, r.rooms[p], Integer.MIN_VALUE}) {
                 Object[] args = new Object[r.rooms.length + 1];
@@ -97,11 +96,10 @@ class CacheTest extends SpyTestBase {
                         () -> call(module(dvb, r.cls), r.method, args));
                 assertEquals("Index " + bad + " out of bounds for length " + r.rooms[p], e.getMessage());
                 assertSameFields(r.layout.fill(r.layout.create(), 3), args[r.rooms.length]);
-                calls++;
             }
         }
         List<String> lines = new ArrayList<>();
-        for (int i = 0; i < calls; i++) lines.addAll(entryLines(r.cls, r.method));
+        for (int i = 0; i < 3 * r.rooms.length; i++) lines.addAll(entryLines(r.cls, r.method));
         assertEquals(lines, logs());
         assertEquals(0, Spy.callCount());
     }

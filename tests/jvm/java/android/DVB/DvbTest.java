@@ -43,7 +43,8 @@ class DvbTest extends SpyTestBase {
 
     @Test
     void loadRegistersEveryClassAndReturnsVersion14() {
-        assertArrayEquals(new int[] {0x00010004, 0, 0}, Spy.entryPoints(), "the callbacks answer 0");
+        assertArrayEquals(new int[] {0x00010004, 0, 0}, Spy.entryPoints(),
+                "JNI_OnLoad's version, then the callbacks' 0");
         assertEquals(List.of("2 DVB register_android_dvb_DVB was called",
                 "2 CFG register_android_dvb_Cfg was called"), List.of(Spy.takeLogs()));
     }
