@@ -88,57 +88,48 @@ jint Spy_callCount(JNIEnv*, jclass) {
     return static_cast<jint>(dvbspy::callCount());
 }
 
-bool callAt(JNIEnv* env, jint i, dvbspy::Call* out) {
-    auto calls = dvbspy::calls();
-    if (i < 0 || static_cast<size_t>(i) >= calls.size()) {
-        jniThrowExceptionFmt(env, "java/lang/IndexOutOfBoundsException", "call %d of %zu", i,
-                             calls.size());
-        return false;
-    }
-    *out = calls[i];
-    return true;
-}
-
-jstring Spy_op(JNIEnv* env, jclass, jint i) {
-    dvbspy::Call c;
-    return callAt(env, i, &c) ? env->NewStringUTF(c.op.c_str()) : nullptr;
+// Whether 0 <= i < n; if not, an IndexOutOfBoundsException for Java.
+bool inRange(JNIEnv* env, const char* what, jint i, size_t n) {
+    if (i >= 0 && static_cast<size_t>(i) < n) return true;
+    jniThrowExceptionFmt(env, "java/lang/IndexOutOfBoundsException", "%s %d of %zu", what, i, n);
+    return false;
 }
 
 jbyteArray toBytes(JNIEnv* env, const void* data, size_t size) {
     jbyteArray a = env->NewByteArray(static_cast<jsize>(size));
-    if (a != nullptr && size != 0) {
+    if (a != nullptr)
         env->SetByteArrayRegion(a, 0, static_cast<jsize>(size), static_cast<const jbyte*>(data));
-    }
     return a;
 }
 
 jlongArray toLongs(JNIEnv* env, const std::vector<jlong>& v) {
     jlongArray a = env->NewLongArray(static_cast<jsize>(v.size()));
-    if (a != nullptr && !v.empty())
-        env->SetLongArrayRegion(a, 0, static_cast<jsize>(v.size()), v.data());
+    if (a != nullptr) env->SetLongArrayRegion(a, 0, static_cast<jsize>(v.size()), v.data());
     return a;
 }
 
+jstring Spy_op(JNIEnv* env, jclass, jint i) {
+    auto calls = dvbspy::calls();
+    return inRange(env, "call", i, calls.size()) ? env->NewStringUTF(calls[i].op.c_str()) : nullptr;
+}
+
 jlongArray Spy_args(JNIEnv* env, jclass, jint i) {
-    dvbspy::Call c;
-    return callAt(env, i, &c) ? toLongs(env, std::vector<jlong>(c.args.begin(), c.args.end()))
-                              : nullptr;
+    auto calls = dvbspy::calls();
+    if (!inRange(env, "call", i, calls.size())) return nullptr;
+    return toLongs(env, std::vector<jlong>(calls[i].args.begin(), calls[i].args.end()));
 }
 
 jbyteArray Spy_record(JNIEnv* env, jclass, jint i, jint r) {
-    dvbspy::Call c;
-    if (!callAt(env, i, &c)) return nullptr;
-    if (r < 0 || static_cast<size_t>(r) >= c.records.size()) {
-        jniThrowExceptionFmt(env, "java/lang/IndexOutOfBoundsException", "record %d of %zu", r,
-                             c.records.size());
-        return nullptr;
-    }
-    return toBytes(env, c.records[r].data(), c.records[r].size());
+    auto calls = dvbspy::calls();
+    if (!inRange(env, "call", i, calls.size())) return nullptr;
+    const auto& records = calls[i].records;
+    if (!inRange(env, "record", r, records.size())) return nullptr;
+    return toBytes(env, records[r].data(), records[r].size());
 }
 
 jlong Spy_owner(JNIEnv* env, jclass, jint i) {
-    dvbspy::Call c;
-    return callAt(env, i, &c) ? static_cast<jlong>(reinterpret_cast<uintptr_t>(c.owner)) : 0;
+    auto calls = dvbspy::calls();
+    return inRange(env, "call", i, calls.size()) ? reinterpret_cast<uintptr_t>(calls[i].owner) : 0;
 }
 
 void Spy_setResult(JNIEnv* env, jclass, jstring op, jint result) {
@@ -190,27 +181,15 @@ jlongArray Spy_liveDvbs(JNIEnv* env, jclass) {
     return toLongs(env, v);
 }
 
-jint Spy_liveDvbCount(JNIEnv*, jclass) {
-    return static_cast<jint>(dvbsvc::liveDvbCount());
-}
-
-android::sp<android::DVB> liveAt(jlong address) {
-    for (const auto& dvb : dvbsvc::liveDvbs()) {
-        if (static_cast<jlong>(reinterpret_cast<uintptr_t>(dvb.get())) == address) return dvb;
-    }
-    return nullptr;
-}
-
 // Strong references on the DVB object at `address`, not counting the one taken to ask; -1
 // when no such object lives.
 jint Spy_strongCount(JNIEnv*, jclass, jlong address) {
-    auto dvb = liveAt(address);
-    return dvb != nullptr ? dvb->getStrongCount() - 1 : -1;
-}
-
-jboolean Spy_hasListener(JNIEnv*, jclass, jlong address) {
-    auto dvb = liveAt(address);
-    return dvb != nullptr && dvb->mListener != nullptr;
+    for (const auto& dvb : dvbsvc::liveDvbs()) {
+        if (reinterpret_cast<uintptr_t>(dvb.get()) == static_cast<uint64_t>(address)) {
+            return dvb->getStrongCount() - 1;
+        }
+    }
+    return -1;
 }
 
 jint Spy_liveListenerCount(JNIEnv*, jclass) {
@@ -221,7 +200,13 @@ void Spy_raise(JNIEnv*, jclass, jint msg, jint ext1, jint ext2, jint count, jint
     dvbspy::raiseEvents(msg, ext1, ext2, count, threads);
 }
 
-jobjectArray toStringArray(JNIEnv* env, const std::vector<std::string>& lines) {
+// Hands the lines of `from` to Java and forgets them.
+jobjectArray take(JNIEnv* env, std::vector<std::string>& from) {
+    std::vector<std::string> lines;
+    {
+        std::lock_guard<std::mutex> lock(gLock);
+        lines.swap(from);
+    }
     ScopedLocalRef<jclass> stringClass(env, env->FindClass("java/lang/String"));
     jobjectArray a =
             env->NewObjectArray(static_cast<jsize>(lines.size()), stringClass.get(), nullptr);
@@ -230,16 +215,6 @@ jobjectArray toStringArray(JNIEnv* env, const std::vector<std::string>& lines) {
         env->SetObjectArrayElement(a, static_cast<jsize>(i), s.get());
     }
     return a;
-}
-
-// Hands the lines of `from` to Java and forgets them.
-jobjectArray take(JNIEnv* env, std::vector<std::string>& from) {
-    std::vector<std::string> lines;
-    {
-        std::lock_guard<std::mutex> lock(gLock);
-        lines.swap(from);
-    }
-    return toStringArray(env, lines);
 }
 
 jobjectArray Spy_takeLogs(JNIEnv* env, jclass) {
@@ -272,13 +247,24 @@ void* exported(const char* name) {
     return sym;
 }
 
-// Runs libDVBjni's JNI_OnLoad once more in this VM (registration is idempotent) and returns
-// its result, which Java cannot see from System.loadLibrary.
-jint Spy_callOnLoad(JNIEnv* env, jclass) {
-    auto onLoad = reinterpret_cast<jint (*)(JavaVM*, void*)>(exported("JNI_OnLoad"));
+// What libDVBjni's exported entry points answer, -99 where one is not exported: JNI_OnLoad run
+// once more in this VM (registration is idempotent; Java cannot see its result from
+// System.loadLibrary), then the module callbacks Strmcallback and Subttlcallback.
+jintArray Spy_entryPoints(JNIEnv* env, jclass) {
+    jint got[3] = {-99, -99, -99};
     JavaVM* vm = nullptr;
     env->GetJavaVM(&vm);
-    return onLoad != nullptr ? onLoad(vm, nullptr) : 0;
+    if (auto onLoad = reinterpret_cast<jint (*)(JavaVM*, void*)>(exported("JNI_OnLoad"))) {
+        got[0] = onLoad(vm, nullptr);
+    }
+    const char* callbacks[] = {"_Z12StrmcallbackPvii", "_Z14SubttlcallbackPvii"};
+    for (int i = 0; i < 2; ++i) {
+        auto fn = reinterpret_cast<int (*)(void*, int, int)>(exported(callbacks[i]));
+        if (fn != nullptr) got[i + 1] = fn(&got, -1, 7);
+    }
+    jintArray a = env->NewIntArray(3);
+    if (a != nullptr) env->SetIntArrayRegion(a, 0, 3, got);
+    return a;
 }
 
 // Entry `index` of the cache that libDVBjni exports as `symbol`, `size` bytes per entry; null
@@ -296,24 +282,6 @@ jbyteArray Spy_cacheEntry(JNIEnv* env, jclass, jstring symbol, jint index, jint 
     return toBytes(env, base + int64_t{index} * size, size);
 }
 
-// The exported module callbacks Strmcallback and Subttlcallback, called with some arguments: what
-// each answers.
-jintArray Spy_callbacks(JNIEnv* env, jclass) {
-    jint got[2];
-    const char* names[] = {"_Z12StrmcallbackPvii", "_Z14SubttlcallbackPvii"};
-    for (int i = 0; i < 2; ++i) {
-        auto fn = reinterpret_cast<int (*)(void*, int, int)>(exported(names[i]));
-        got[i] = fn != nullptr ? fn(&got, -1, 7) : -99;  // -99: not exported
-    }
-    jintArray a = env->NewIntArray(2);
-    if (a != nullptr) env->SetIntArrayRegion(a, 0, 2, got);
-    return a;
-}
-
-jint Spy_pointerSize(JNIEnv*, jclass) {
-    return static_cast<jint>(sizeof(void*));
-}
-
 const JNINativeMethod gMethods[] = {
         MAKE_JNI_NATIVE_METHOD("reset", "()V", Spy_reset),
         MAKE_JNI_NATIVE_METHOD("callCount", "()I", Spy_callCount),
@@ -326,18 +294,14 @@ const JNINativeMethod gMethods[] = {
         MAKE_JNI_NATIVE_METHOD("setList", "(Ljava/lang/String;[[B)V", Spy_setList),
         MAKE_JNI_NATIVE_METHOD("omit", "([Ljava/lang/String;)V", Spy_omit),
         MAKE_JNI_NATIVE_METHOD("liveDvbs", "()[J", Spy_liveDvbs),
-        MAKE_JNI_NATIVE_METHOD("liveDvbCount", "()I", Spy_liveDvbCount),
         MAKE_JNI_NATIVE_METHOD("strongCount", "(J)I", Spy_strongCount),
-        MAKE_JNI_NATIVE_METHOD("hasListener", "(J)Z", Spy_hasListener),
         MAKE_JNI_NATIVE_METHOD("liveListenerCount", "()I", Spy_liveListenerCount),
         MAKE_JNI_NATIVE_METHOD("raise", "(IIIII)V", Spy_raise),
         MAKE_JNI_NATIVE_METHOD("takeLogs", "()[Ljava/lang/String;", Spy_takeLogs),
         MAKE_JNI_NATIVE_METHOD("takeGlobalRefEvents", "()[Ljava/lang/String;",
                                Spy_takeGlobalRefEvents),
         MAKE_JNI_NATIVE_METHOD("trackGlobalRefs", "()V", Spy_trackGlobalRefs),
-        MAKE_JNI_NATIVE_METHOD("pointerSize", "()I", Spy_pointerSize),
-        MAKE_JNI_NATIVE_METHOD("callbacks", "()[I", Spy_callbacks),
-        MAKE_JNI_NATIVE_METHOD("callOnLoad", "()I", Spy_callOnLoad),
+        MAKE_JNI_NATIVE_METHOD("entryPoints", "()[I", Spy_entryPoints),
         MAKE_JNI_NATIVE_METHOD("cacheEntry", "(Ljava/lang/String;II)[B", Spy_cacheEntry),
 };
 

@@ -1,5 +1,8 @@
 package dvbtest;
 
+import java.lang.reflect.InvocationTargetException;
+import java.lang.reflect.Method;
+import java.lang.reflect.Modifier;
 import java.util.Arrays;
 import java.util.List;
 
@@ -29,11 +32,12 @@ public final class LoadCheck {
         {"no-teltxt-field", TUNER, DVB, CFG, FAILED},
         {"no-dvb-field", "Can't find DVB.mNativeContext", DVB, CFG, INIT},
         {"no-post-event", "Can't find DVB.postEventFromNative", DVB, CFG, INIT},
+        {"no-fields", null, DVB, CFG, INIT},
     };
 
     static native String[] takeLogs();
 
-    public static void main(String[] args) {
+    public static void main(String[] args) throws Exception {
         System.loadLibrary("dvbtest");
         Throwable thrown = null;
         try {
@@ -49,10 +53,53 @@ public final class LoadCheck {
             if (want == null ? got != null : !want.equals(got)) fail("expected " + want + ", got " + got);
             List<String> lines = Arrays.asList(m).subList(2, m.length);
             if (!logs.equals(lines)) fail("log lines " + logs + ", expected " + lines);
+            if (m[0].equals("no-fields")) checkFields();
             System.out.println("LoadCheck " + args[0] + ": ok");
             return;
         }
         fail("unknown mode " + args[0]);
+    }
+
+    /**
+     * On record classes that have lost every field, each native method that reads or fills a
+     * record object must stop at its first failed look-up and leave the VM's NoSuchFieldError
+     * for Java (under -Xcheck:jni, making no further JNI call), never crash.
+     */
+    static void checkFields() throws Exception {
+        Class<?> dvbClass = Class.forName("android.DVB.DVB");
+        Object dvb = dvbClass.getConstructor().newInstance();
+        int checked = 0;
+        for (String name : new String[] {"Scnm", "Strm", "Cfg", "Subttl", "Teltxt"}) {
+            Class<?> cls = Class.forName("android.DVB." + name);
+            Object module = cls.getConstructor(dvbClass).newInstance(dvb);
+            for (Method m : cls.getDeclaredMethods()) {
+                List<Class<?>> types = Arrays.asList(m.getParameterTypes());
+                if (!Modifier.isNative(m.getModifiers())
+                        || types.stream().noneMatch(t -> t.getName().startsWith("android.DVB."))) {
+                    continue;
+                }
+                Object[] values = new Object[types.size()];
+                for (int i = 0; i < values.length; i++) values[i] = valueOf(types.get(i));
+                try {
+                    m.invoke(module, values);
+                    fail(m.getName() + " returned normally");
+                } catch (InvocationTargetException e) {
+                    if (!(e.getCause() instanceof NoSuchFieldError)) fail(m.getName() + " threw " + e.getCause());
+                }
+                checked++;
+            }
+        }
+        dvbClass.getMethod("release").invoke(dvb);
+        if (checked != 42) fail(checked + " methods take a record object, expected 42");
+    }
+
+    static Object valueOf(Class<?> type) throws Exception {
+        if (type == int.class) return 0;
+        if (type == long.class) return 0L;
+        if (type == boolean.class) return false;
+        if (type == String.class) return "x";
+        if (type == byte[].class) return new byte[16];
+        return type.getConstructor().newInstance();
     }
 
     static void fail(String message) {

@@ -90,19 +90,16 @@ class BehaviourTest extends SpyTestBase {
         assertEquals(0, Spy.callCount());
     }
 
-    /** Text a module leaves without a zero byte ends at its field; bad bytes become U+FFFD. */
+    /** Bad bytes in module text become U+FFFD (its end without a zero byte: ContractTest). */
     @Test
     void moduleTextEndsAtItsFieldAndBadBytesAreReplaced() {
         byte[] info = new byte[1728];
         le(info).putInt(68, 2);
-        Arrays.fill(info, 72 + 4, 72 + 12, (byte) 'L');
         byte[] bad = bytes('a', 0xFF, 'b', 0xC0, 0x80, 0xE2, 0x82, 'c', 0xC3, 0);
         System.arraycopy(bad, 0, info, 72 + 46 + 13, bad.length);
         Spy.setOut("Strm::CreatStreamInfo", 1, 0, info);
         dvb.getStrm().Strm_CreatStreamInfo(0, new Strm.STRM_StreamInfo());
         Strm.AudioContent a = new Strm.AudioContent();
-        dvb.getStrm().Strm_GetAudioStreamInfo(0, a);
-        assertEquals(Arrays.asList("LLLL", "LLLL"), Arrays.asList(a.langCode0, a.langCode1));
         dvb.getStrm().Strm_GetAudioStreamInfo(1, a);
         assertEquals("a\uFFFDb\u0000\uFFFD\uFFFDc\uFFFD", a.streamName);
     }

@@ -11,16 +11,22 @@ import org.junit.jupiter.api.Test;
 /** Library entry, binding of the DVB object, its references, the listener and its events. */
 class DvbTest extends SpyTestBase {
 
-    /** The lines of one DVB method: its own, then setDVB's with `address` (0: none) as %p. */
-    static List<String> lines(String method, long address) {
+    /** The lines of DVB `methods`, each its own, then setDVB's with `address` (0: none) as %p. */
+    static List<String> lines(long address, String... methods) {
         String p = address == 0 ? "(nil)" : String.format("0x%x", address);
-        return List.of("2 DVB " + method + " was called", "2 DVB setDVB was called",
-                "2 DVB setDVB dvb.get() " + p, "2 DVB setDVB dvb obj was set to context " + p);
+        List<String> lines = new ArrayList<>();
+        for (String m : methods) lines.add("2 DVB android_dvb_DVB_" + m + " was called");
+        lines.addAll(List.of("2 DVB setDVB was called", "2 DVB setDVB dvb.get() " + p,
+                "2 DVB setDVB dvb obj was set to context " + p));
+        return lines;
     }
 
+    /** The only live DVB object, which only the Java object holds, with the only listener. */
     static long onlyDvb() {
         long[] live = Spy.liveDvbs();
         assertEquals(1, live.length, "live DVB objects");
+        assertEquals(1, Spy.strongCount(live[0]), "the Java object's reference only");
+        assertEquals(1, Spy.liveListenerCount(), "an earlier listener went with its object");
         return live[0];
     }
 
@@ -37,8 +43,8 @@ class DvbTest extends SpyTestBase {
 
     @Test
     void loadRegistersEveryClassAndReturnsVersion14() {
-        assertArrayEquals(new int[] {0, 0}, Spy.callbacks(), "the exported callbacks answer 0");
-        assertEquals(0x00010004, Spy.callOnLoad());
+        assertArrayEquals(new int[] {0x00010004, 0, 0}, Spy.entryPoints(),
+                "JNI_OnLoad's version, then the callbacks' 0");
         assertEquals(List.of("2 DVB register_android_dvb_DVB was called",
                 "2 CFG register_android_dvb_Cfg was called"), List.of(Spy.takeLogs()));
     }
@@ -51,30 +57,24 @@ class DvbTest extends SpyTestBase {
         dvb = new DVB();
         assertEquals(List.of("new class", "new object"), List.of(Spy.takeGlobalRefEvents()));
         long first = onlyDvb();
-        if (Spy.pointerSize() == 4) assertEquals(first, dvb.nativeContext() & 0xFFFFFFFFL);
-        assertEquals(1, Spy.strongCount(first), "the Java object's reference only");
-        assertTrue(Spy.hasListener(first));
+        if (!WIDE) assertEquals(first, dvb.nativeContext() & 0xFFFFFFFFL);
         int firstContext = dvb.nativeContext();
         Spy.takeLogs();
         call(dvb, "native_setup", new WeakReference<>(dvb)); // binds anew, drops the first
         long second = onlyDvb();
         assertNotEquals(first, second);
         assertNotEquals(firstContext, dvb.nativeContext());
-        assertEquals(1, Spy.strongCount(second));
-        assertEquals(1, Spy.liveListenerCount(), "the first listener went with its object");
-        assertEquals(lines("android_dvb_DVB_native_setup", second), List.of(Spy.takeLogs()));
+        assertEquals(lines(second, "native_setup"), List.of(Spy.takeLogs()));
         Spy.takeGlobalRefEvents();
         dvb.release();
         assertEquals(List.of("delete object", "delete class"), List.of(Spy.takeGlobalRefEvents()));
         assertEquals(0, dvb.nativeContext());
-        assertEquals(0, Spy.liveDvbCount() + Spy.liveListenerCount());
-        assertEquals(lines("android_dvb_DVB_release", 0), List.of(Spy.takeLogs()));
+        assertEquals(0, Spy.liveDvbs().length + Spy.liveListenerCount());
+        assertEquals(lines(0, "release"), List.of(Spy.takeLogs()));
         dvb.release(); // an unbound object only logs
-        assertEquals(lines("android_dvb_DVB_release", 0), List.of(Spy.takeLogs()));
+        assertEquals(lines(0, "release"), List.of(Spy.takeLogs()));
         dvb.finalize();
-        List<String> finalize = new ArrayList<>(List.of("2 DVB android_dvb_DVB_native_finalize was called"));
-        finalize.addAll(lines("android_dvb_DVB_release", 0));
-        assertEquals(finalize, List.of(Spy.takeLogs()));
+        assertEquals(lines(0, "native_finalize", "release"), List.of(Spy.takeLogs()));
         dvb = null;
     }
 
@@ -120,14 +120,14 @@ class DvbTest extends SpyTestBase {
     @Test
     @SuppressWarnings({"deprecation", "removal"})
     void theContextTableHoldsExactly4096BoundObjects() {
-        assumeTrue(Spy.pointerSize() == 8, "a 32-bit context is the address itself");
+        assumeTrue(WIDE, "a 32-bit context is the address itself");
         dvb.release();
         dvb = null;
-        for (int i = 0; i < 3 && Spy.liveDvbCount() > 0; i++) {
+        for (int i = 0; i < 3 && Spy.liveDvbs().length > 0; i++) {
             System.gc();
             System.runFinalization();
         }
-        assertEquals(0, Spy.liveDvbCount(), "objects of earlier tests still bound");
+        assertEquals(0, Spy.liveDvbs().length, "objects of earlier tests still bound");
         Spy.trackGlobalRefs();
         Spy.takeGlobalRefEvents();
         List<DVB> bound = new ArrayList<>();
@@ -138,14 +138,14 @@ class DvbTest extends SpyTestBase {
             assertEquals(RuntimeException.class, e.getClass());
             assertEquals("Out of memory", e.getMessage());
             assertEquals(4096, bound.size());
-            assertEquals(4096, Spy.liveDvbCount(), "the refused object is gone");
+            assertEquals(4096, Spy.liveDvbs().length, "the refused object is gone");
             assertEquals(4096, Spy.liveListenerCount(), "and its listener with it");
             assertEquals(List.of(2 * 4097, 2 * 4096), refs(), "the refused listener's references too");
         } finally {
             bound.forEach(DVB::release);
             Spy.takeLogs();
         }
-        assertEquals(0, Spy.liveDvbCount());
+        assertEquals(0, Spy.liveDvbs().length);
         dvb = new DVB(); // room again
     }
 
@@ -191,7 +191,7 @@ class DvbTest extends SpyTestBase {
         assertEquals(2000, received.get(), "events to the bound object");
         dvb.release();
         dvb = null;
-        assertEquals(0, Spy.liveDvbCount() + Spy.liveListenerCount(), "objects or listeners left");
+        assertEquals(0, Spy.liveDvbs().length + Spy.liveListenerCount(), "objects or listeners left");
         assertEquals(List.of(2 * 301, 0), refs(), "two global references per bound object, all gone");
     }
 }

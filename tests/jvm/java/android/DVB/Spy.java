@@ -20,16 +20,12 @@ final class Spy {
     static native void setList(String op, byte[][] nodes);
     static native void omit(String[] modules);
     static native long[] liveDvbs();
-    static native int liveDvbCount();
     static native int strongCount(long dvb);
-    static native boolean hasListener(long dvb);
     static native int liveListenerCount();
     static native void raise(int msg, int ext1, int ext2, int count, int threads);
     static native String[] takeLogs();
     static native String[] takeGlobalRefEvents();
     static native void trackGlobalRefs();
-    static native int pointerSize();
-    static native int[] callbacks();
-    static native int callOnLoad();
+    static native int[] entryPoints();
     static native byte[] cacheEntry(String symbol, int index, int size);
 }

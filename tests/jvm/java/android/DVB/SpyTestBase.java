@@ -16,6 +16,7 @@ abstract class SpyTestBase {
     static final long LOW = (int) HANDLE;
     static final String GETTER = "2 SCNM getScnm was called";
     static final String NET_BEGIN = "2 SCNM +++android_dvb_Scnm_GetServiceList";
+    static final boolean WIDE = System.getProperty("sun.arch.data.model").equals("64");
 
     static {
         Spy.reset(); // loads the test library first
@@ -41,23 +42,18 @@ abstract class SpyTestBase {
         return call(d, "get" + cls);
     }
 
-    static Method method(Class<?> cls, String name) {
-        for (Method m : cls.getDeclaredMethods()) {
-            if (m.getName().equals(name)) {
-                m.setAccessible(true);
-                return m;
-            }
-        }
-        throw new AssertionError(cls.getSimpleName() + " has no " + name);
-    }
-
     /** Calls `name` on `target`, handing back what it threw as it threw it. */
     static Object call(Object target, String name, Object... args) throws Throwable {
-        try {
-            return method(target.getClass(), name).invoke(target, args);
-        } catch (InvocationTargetException e) {
-            throw e.getCause();
+        for (Method m : target.getClass().getDeclaredMethods()) {
+            if (!m.getName().equals(name)) continue;
+            m.setAccessible(true);
+            try {
+                return m.invoke(target, args);
+            } catch (InvocationTargetException e) {
+                throw e.getCause();
+            }
         }
+        throw new AssertionError(target.getClass().getSimpleName() + " has no " + name);
     }
 
     /** The calls the spy saw, one op name each. */
@@ -65,6 +61,15 @@ abstract class SpyTestBase {
         List<String> out = new ArrayList<>();
         for (int i = 0; i < Spy.callCount(); i++) out.add(Spy.op(i));
         return out;
+    }
+
+    /** The lines a call of `method` (of class `cls`) writes on entry, before it checks anything. */
+    static List<String> entryLines(String cls, String method) {
+        List<String> lines = new ArrayList<>();
+        if (method.equals("Scnm_GetNetworkList")) lines.add(NET_BEGIN);
+        if (cls.equals("Scnm")) lines.add(GETTER);
+        if (method.equals("Cfg_Reset")) lines.add("2 CFG android_dvb_Cfg_Reset was called");
+        return lines;
     }
 
     /** The only call the spy saw, which must be of `op`; returns its index. */
