@@ -187,6 +187,11 @@ struct EitSection {
     std::vector<uint16_t> events;
 };
 
+// The frame rates of an MPEG video sequence header's frame_rate_code 1 to 8 (ISO/IEC 13818-2),
+// in frames per 1000 seconds as Component::frameRateMilli holds them.
+inline constexpr uint32_t kMpegFrameRates[9] = {0,     23976, 24000, 25000, 29970,
+                                                30000, 50000, 59940, 60000};
+
 // What the rows and control bits of a TeletextPage hold, at level 1.
 namespace ttx {
 // Spacing attributes: alphanumeric colours 0x01..0x07, mosaic colours 0x11..0x17, and these.

@@ -822,6 +822,59 @@ void Reader::push(dvbpsi_t* h, uint16_t pid, const uint8_t* s, size_t n) {
 }
 
 // Second pass: the PES of subtitle and teletext PIDs of the PMTs, decoded into the services.
+// What a video PID's PES starts say of its pictures: the frame rate and size of an MPEG video
+// sequence header where the stream has one, else the frame rate from the smallest step
+// between the decoding times (or presentation times, where a PES gives no decoding time) of
+// its first PES. The sequence parameter sets of H.264 and HEVC are not read: their streams get
+// the frame rate only.
+struct VideoProbe {
+    static constexpr int kStarts = 32;  // PES starts looked at
+    Component* component;
+    int starts = 0;
+    uint64_t last = 0;
+    uint64_t step = 0;      // the smallest step seen, 90 kHz
+    uint32_t sequence = 0;  // the frame rate of a sequence header
+
+    void start(const uint8_t* p) {
+        const size_t offset = (p[3] & 0x20) ? 5 + size_t{p[4]} : 4;
+        if (offset + 19 > kPacket) return;
+        const uint8_t* pes = p + offset;
+        if (pes[0] != 0 || pes[1] != 0 || pes[2] != 1 || (pes[3] & 0xF0) != 0xE0 ||
+            !(pes[7] & 0x80))
+            return;
+        const uint64_t t = readPts(pes + ((pes[7] & 0xC0) == 0xC0 ? 14 : 9));
+        const uint64_t delta = (t - last) & (kPts33 - 1);
+        // A step of a second or more, or none, is a discontinuity or a repeated time.
+        if (starts++ > 0 && delta > 0 && delta < 90000 && (step == 0 || delta < step)) step = delta;
+        last = t;
+        // A sequence header at the start of the payload, in this packet.
+        for (size_t at = 9 + size_t{pes[8]}; offset + at + 8 <= kPacket; ++at) {
+            const uint8_t* h = pes + at;
+            if (h[0] != 0 || h[1] != 0 || h[2] != 1) continue;
+            if (h[3] != 0xB3) break;
+            const uint16_t width = uint16_t(h[4] << 4 | h[5] >> 4);
+            const uint16_t height = uint16_t((h[5] & 0x0F) << 8 | h[6]);
+            const uint8_t code = h[7] & 0x0F;
+            if (width == 0 || height == 0 || code == 0 || code > 8) break;
+            component->width = width, component->height = height;
+            sequence = kMpegFrameRates[code];
+            break;
+        }
+    }
+
+    // The rate of the smallest step, taken as the nearest common rate within half a percent.
+    void finish() {
+        if (sequence != 0) return void(component->frameRateMilli = sequence);
+        if (step == 0) return;
+        const uint32_t milli = uint32_t((uint64_t{90000000} + step / 2) / step);
+        component->frameRateMilli = milli;
+        for (uint32_t common : kMpegFrameRates) {
+            if (common != 0 && (milli > common ? milli - common : common - milli) * 200 <= common)
+                component->frameRateMilli = common;
+        }
+    }
+};
+
 void Reader::timedContent(const uint8_t* d, size_t begin, size_t size) {
     // Times count from the capture's first PCR, else its first PTS.
     const bool haveRef = pcrPid_ >= 0 || ptsPid_ >= 0;
@@ -844,8 +897,10 @@ void Reader::timedContent(const uint8_t* d, size_t begin, size_t size) {
         bool inPes = false;
     };
     std::vector<Stream> streams;
+    std::vector<VideoProbe> videos;
     for (auto& [program, s] : pmtServices_) {
-        for (const Component& c : s.components) {
+        for (Component& c : s.components) {
+            if (c.kind == Kind::Video) videos.push_back({&c});
             if (c.kind == Kind::Subtitle) {
                 Stream& st = streams.emplace_back(c.pid, &s);
                 st.subtitles = std::make_unique<DvbSubtitleDecoder>(c.compositionPageId,
@@ -859,7 +914,7 @@ void Reader::timedContent(const uint8_t* d, size_t begin, size_t size) {
 #endif
         }
     }
-    if (streams.empty()) return;
+    if (streams.empty() && videos.empty()) return;
     std::vector<std::vector<uint8_t>> pes;
     auto deliver = [&](Stream& st) {
         for (const std::vector<uint8_t>& one : pes) {
@@ -881,6 +936,7 @@ void Reader::timedContent(const uint8_t* d, size_t begin, size_t size) {
         pes.clear();
     };
     std::array<int8_t, 8192> cc{};
+    size_t probing = videos.size();
     for (size_t pos = begin; pos + kPacket <= size;) {
         if (d[pos] != kSync) {
             pos = findSync(d, size, pos + 1);
@@ -894,6 +950,16 @@ void Reader::timedContent(const uint8_t* d, size_t begin, size_t size) {
         const bool broken =
                 (p[1] & 0x80) || (payload && last >= 0 && now != last && now != ((last + 1) & 0xF));
         if (payload && !(p[1] & 0x80)) cc[pid] = int8_t(now + 1);
+        if (payload && (p[1] & 0xC0) == 0x40 && probing > 0) {
+            for (VideoProbe& v : videos) {
+                if (v.component->pid == pid && v.starts < VideoProbe::kStarts) {
+                    v.start(p);
+                    probing -= v.starts == VideoProbe::kStarts;
+                }
+            }
+            // A capture with no subtitles or teletext is walked no further.
+            if (probing == 0 && streams.empty()) break;
+        }
         for (Stream& st : streams) {
             if (st.pid != pid) continue;
             if (broken && st.inPes) ++stats_.pesDropped, st.inPes = false;
@@ -903,6 +969,7 @@ void Reader::timedContent(const uint8_t* d, size_t begin, size_t size) {
             deliver(st);
         }
     }
+    for (VideoProbe& v : videos) v.finish();
     for (Stream& st : streams) {
         st.assembler.flush(pes);
         deliver(st);

@@ -870,14 +870,9 @@ void TsWriter::pes(uint16_t pid, uint8_t streamId, uint64_t pts, size_t payload,
     uint8_t fill = 0x00, last = 0x00;
     if (c.kind == Kind::Video && (c.streamType == 0x01 || c.streamType == 0x02) && payload >= 12) {
         // Sequence header: size, aspect ratio 16:9, frame rate code, bit rate in 400 bit/s.
-        static constexpr struct {
-            uint32_t milli;
-            uint8_t code;
-        } kRateCodes[] = {{23976, 1}, {24000, 2}, {25000, 3}, {29970, 4},
-                          {30000, 5}, {50000, 6}, {59940, 7}, {60000, 8}};
-        uint8_t rate = 3;
-        for (const auto& r : kRateCodes) {
-            if (c.frameRateMilli == r.milli) rate = r.code;
+        uint8_t rate = 3;  // 25 Hz unless the component has another rate the header can say
+        for (uint8_t code = 1; code < 9; ++code) {
+            if (c.frameRateMilli == kMpegFrameRates[code]) rate = code;
         }
         uint32_t w = c.width ? c.width : 720, h = c.height ? c.height : 576;
         uint32_t bits = opt_.videoBitRate / 400;
