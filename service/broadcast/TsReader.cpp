@@ -950,7 +950,8 @@ void Reader::timedContent(const uint8_t* d, size_t begin, size_t size) {
         const bool broken =
                 (p[1] & 0x80) || (payload && last >= 0 && now != last && now != ((last + 1) & 0xF));
         if (payload && !(p[1] & 0x80)) cc[pid] = int8_t(now + 1);
-        if (payload && (p[1] & 0xC0) == 0x40 && probing > 0) {
+        // Payload starts without transport error, in the clear (a scrambled one hides its PES).
+        if (payload && (p[1] & 0xC0) == 0x40 && (p[3] & 0xC0) == 0 && probing > 0) {
             for (VideoProbe& v : videos) {
                 if (v.component->pid == pid && v.starts < VideoProbe::kStarts) {
                     v.start(p);
