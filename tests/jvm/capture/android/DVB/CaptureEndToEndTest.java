@@ -118,24 +118,8 @@ class CaptureEndToEndTest {
 
     /** Starts service `key` of the scan on the transponder that carries it. */
     static long play(int key) {
-        Scnm.SCNM_ServiceInfo info = found.get(key);
-        Strm strm = dvb.getStrm();
-        Strm.STRM_OpenSettings open = new Strm.STRM_OpenSettings();
-        open.szPath = "";
-        long stream = strm.Strm_Open(open);
-        Strm.STRM_Service svc = new Strm.STRM_Service();
-        svc.svcId = info.svcId;
-        svc.pcrPid = info.pcrPid;
-        Strm.STRM_LangCode langs = new Strm.STRM_LangCode();
-        langs.langCode0 = langs.langCode1 = "fra";
-        for (Scnm.SCNMNET_FrontEndSettings t : transponders) {
-            Strm.STRM_FrontEnd fe = new Strm.STRM_FrontEnd();
-            fe.type = 2;
-            fe.frequency = t.frequency;
-            fe.bandwidth = 8000;
-            if (strm.Strm_Start(stream, svc, langs, fe) == 0) return stream;
-        }
-        throw new AssertionError("no transponder carries service " + info.svcId);
+        return EndToEnd.play(dvb.getStrm(), found.get(key), "fra", "fra",
+                transponders.stream().mapToInt(t -> t.frequency).toArray());
     }
 
     @Test
@@ -158,10 +142,7 @@ class CaptureEndToEndTest {
 
             // The database walked from the event running now: every event the schedule broadcast
             // from then on, in order, with its bytes.
-            Strm.EpgSvc svc = new Strm.EpgSvc();
-            svc.svcId = sid;
-            svc.tsId = 4;
-            svc.onId = 8442;
+            Strm.EpgSvc svc = EndToEnd.epg(found.get(8442 << 16 | sid));
             assertEquals(0, strm.EpgMd_ClearService());
             assertEquals(0, strm.EpgMd_AddService(svc));
             awaitStore(sid);
@@ -206,12 +187,12 @@ class CaptureEndToEndTest {
         for (int i = 0; i < info.subtitleCount && sc.pid != 0x157; i++) dvb.getStrm().Strm_GetSubTilteStreamInfo(i, sc);
         assertEquals(0x157, sc.pid);
         Subttl sub = dvb.getSubttl();
-        long decoder = Compose.start(sub, sc, stream);
+        long decoder = EndToEnd.start(sub, sc, stream);
         Subttl.SUBTTL_Data_t data = new Subttl.SUBTTL_Data_t();
         for (int i = 0; i < 2000 && data.numRegions == 0; i++, Thread.sleep(10)) sub.Subttl_GetData(decoder, data);
         BufferedImage want = ImageIO.read(new File(TESTDATA, "truth/dvbsub-canalplus-cinema.pid0157.set1.ffmpeg.png"));
         BufferedImage got = dvbdemo.DisplaySetImage.compose(sub, data);
-        int differ = Compose.differing(want, got);
+        int differ = EndToEnd.differing(want, got);
         assertEquals(0, differ, "pixels that differ from ffmpeg's rendering");
         assertEquals(0, sub.Subttl_Stop(decoder));
         assertEquals(0, dvb.getStrm().Strm_Close(stream));

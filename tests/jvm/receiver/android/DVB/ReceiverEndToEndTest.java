@@ -108,22 +108,7 @@ class ReceiverEndToEndTest {
     @Order(3)
     void aServicePlaysWithItsStatusComponentsAndEvents() throws InterruptedException {
         Strm strm = dvb.getStrm();
-        Strm.STRM_OpenSettings open = new Strm.STRM_OpenSettings();
-        open.szPath = "";
-        stream = strm.Strm_Open(open);
-        Strm.STRM_Service svc = new Strm.STRM_Service();
-        svc.svcId = kanalEins.svcId;
-        svc.videoPid = kanalEins.videoPid;
-        svc.audioPid = kanalEins.audioPid;
-        svc.pcrPid = kanalEins.pcrPid;
-        Strm.STRM_FrontEnd fe = new Strm.STRM_FrontEnd();
-        fe.type = 2;
-        fe.frequency = 506000;
-        fe.bandwidth = 8000;
-        Strm.STRM_LangCode langs = new Strm.STRM_LangCode();
-        langs.langCode0 = "deu";
-        langs.langCode1 = "eng";
-        assertEquals(0, strm.Strm_Start(stream, svc, langs, fe));
+        stream = EndToEnd.play(strm, kanalEins, "deu", "eng", 506000);
         Strm.STRM_GetStatus a = new Strm.STRM_GetStatus();
         Strm.STRM_GetStatus b = new Strm.STRM_GetStatus();
         for (int i = 0; i < 500 && (a.feStatus & 0x10) == 0; i++, Thread.sleep(10)) strm.Strm_GetStatus(stream, a);
@@ -152,10 +137,7 @@ class ReceiverEndToEndTest {
         assertTrue(nowExt.itemCount > 0 && now.name.length > 0);
 
         // The event database: the service's week stored, then walked from now on.
-        Strm.EpgSvc epg = new Strm.EpgSvc();
-        epg.svcId = kanalEins.svcId;
-        epg.tsId = kanalEins.tsId;
-        epg.onId = kanalEins.onId;
+        Strm.EpgSvc epg = EndToEnd.epg(kanalEins);
         assertEquals(0, strm.EpgMd_ClearService());
         assertEquals(0, strm.EpgMd_AddService(epg));
         assertEquals(kanalEins.svcId, (int) next(260).get(1));
@@ -176,7 +158,7 @@ class ReceiverEndToEndTest {
         // A dump of the transponder runs meanwhile, for ffmpeg to render its subtitles.
         File dump = new File(EPG_DB.getParent(), "e2e-dump.ts");
         assertEquals(0, dvb.getCfg().Cfg_TSDumpStart(0, 0, 0, dump.getPath()));
-        long decoder = Compose.start(sub, sc, stream);
+        long decoder = EndToEnd.start(sub, sc, stream);
         next(240); // the display set on the air at the start, sent before the dump began
         while (next(240).get(2) == 0) continue;
         Subttl.SUBTTL_Data_t data = new Subttl.SUBTTL_Data_t();
@@ -185,7 +167,7 @@ class ReceiverEndToEndTest {
         BufferedImage shown = dvbdemo.DisplaySetImage.compose(sub, data);
         Thread.sleep(200);
         assertEquals(0, dvb.getCfg().Cfg_TSDumpStop());
-        List<Integer> differing = ffmpegFrames(dump, sc.pid).stream().map(f -> Compose.differing(f, shown))
+        List<Integer> differing = ffmpegFrames(dump, sc.pid).stream().map(f -> EndToEnd.differing(f, shown))
                 .collect(java.util.stream.Collectors.toList());
         assertTrue(differing.isEmpty() || differing.contains(0), "ffmpeg renders what the readers give: " + differing);
         Subttl.SUBTTL_Region_t region = new Subttl.SUBTTL_Region_t();
