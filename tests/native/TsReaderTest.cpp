@@ -2,42 +2,21 @@
 // a segment reader made them, not this reader), and the broadcast setting's errors.
 #include <gtest/gtest.h>
 
-#include <unistd.h>
 #include <ctime>
-#include <filesystem>
-#include <fstream>
 #include <map>
-#include <nlohmann/json.hpp>
 #include <set>
 #include <sstream>
 #include <tuple>
 
+#include "Captures.h"
 #include "broadcast/BroadcastSource.h"
 #include "broadcast/DvbText.h"
 
 using namespace dvbmodel;
+using namespace testdata;
 using nlohmann::json;
-namespace fs = std::filesystem;
 
 namespace {
-
-const std::string kData = DVB_TESTDATA_DIR;
-
-#define NEED_CAPTURE(name)               \
-    if (!fs::exists(kData + "/" + name)) \
-    GTEST_SKIP() << "capture " << name << " absent: " << kData << " is not there"
-
-json truth(const std::string& name) {
-    std::ifstream in(kData + "/truth/" + name + ".json");
-    return json::parse(in);
-}
-
-std::string unhex(const std::string& hex) {
-    std::string out;
-    for (size_t i = 0; i + 1 < hex.size(); i += 2)
-        out += char(std::stoi(hex.substr(i, 2), nullptr, 16));
-    return out;
-}
 
 int64_t utc(const std::string& iso) {  // 2019-01-22T12:30:00Z
     std::tm tm{};
@@ -77,7 +56,7 @@ const Event* find(const Service* s, int id) {
 TEST(TsReader, FrenchMultiplexMatchesItsTruth) {
     NEED_CAPTURE("fr-dvbt-multiplex-si.ts");
     const json t = truth("fr-dvbt-multiplex-si");
-    const Loaded l = load(kData + "/fr-dvbt-multiplex-si.ts");
+    const Loaded l = load(kDir + "/fr-dvbt-multiplex-si.ts");
     EXPECT_EQ(l.b.start, utc(t["time"]["tdt_first_utc"]));
     EXPECT_EQ(l.b.loopMillis,
               1000 * (utc(t["time"]["tdt_last_utc"]) - utc(t["time"]["tdt_first_utc"])));
@@ -172,7 +151,7 @@ TEST(TsReader, FrenchMultiplexMatchesItsTruth) {
 TEST(TsReader, CanalPlusServiceComponents) {
     NEED_CAPTURE("dvbsub-canalplus-cinema.ts");
     const json t = truth("dvbsub-canalplus-cinema");
-    const Loaded l = load(kData + "/dvbsub-canalplus-cinema.ts");
+    const Loaded l = load(kDir + "/dvbsub-canalplus-cinema.ts");
     const json& pmt = t["pmts"][0];
     const json& sdt = t["sdt"][0]["services"][0];
     const Service* s = l.services.at({t["sdt"][0]["onid"], t["sdt"][0]["tsid"], sdt["sid"]});
@@ -208,7 +187,7 @@ TEST(TsReader, CanalPlusServiceComponents) {
 TEST(TsReader, DamagedCaptureKeepsWhatIsSoundAndCountsTheRest) {
     NEED_CAPTURE("damaged-subtitles-teletext.ts");
     const json t = truth("damaged-subtitles-teletext");
-    const Loaded l = load(kData + "/damaged-subtitles-teletext.ts");
+    const Loaded l = load(kDir + "/damaged-subtitles-teletext.ts");
     // Every PMT copy fails its CRC: counted, and the service keeps no components.
     EXPECT_GE(l.stats.crcErrors,
               uint32_t(t["pmt_crc_problem"]["pmt_sections_with_bad_crc_in_capture"]));
@@ -224,14 +203,13 @@ TEST(TsReader, DamagedCaptureKeepsWhatIsSoundAndCountsTheRest) {
 }
 
 TEST(TsReader, SettingErrorsNameTheFileAndLine) {
-    const fs::path dir = fs::temp_directory_path() / ("tsreader-" + std::to_string(getpid()));
-    fs::create_directories(dir);
+    TempDir dir;
     auto write = [&](const std::string& name, const std::string& text) {
         std::ofstream(dir / name) << text;
-        return (dir / name).string();
+        return dir / name;
     };
     const std::string notTs = write("notes.ts", "Good grief, this is text\n");
-    const std::string absent = (dir / "absent.ts").string(), x = (dir / "x.ts").string();
+    const std::string absent = dir / "absent.ts", x = dir / "x.ts";
     std::vector<std::pair<std::string, std::string>> cases = {
             {notTs, notTs + ": not an MPEG transport stream"},
             {absent, absent + ": no such file or folder"},
@@ -260,7 +238,6 @@ TEST(TsReader, SettingErrorsNameTheFileAndLine) {
         EXPECT_EQ(error.substr(0, want.size()), want);
         EXPECT_TRUE(b.networks.empty());
     }
-    fs::remove_all(dir);
 }
 
 // Tuning as "delivery kHz symbols/s bandwidth modulation polarization orbit", in model codes.
@@ -289,12 +266,11 @@ TEST(TsReader, BroadcastLinesGiveTheirTuning) {
 
 TEST(TsReader, BroadcastFileTunesItsCaptureAndTheRuleTheRest) {
     NEED_CAPTURE("fr-dvbt-multiplex-si.ts");
-    const fs::path file =
-            fs::temp_directory_path() / ("fr-" + std::to_string(getpid()) + ".broadcast");
-    const std::string rel = fs::relative(kData + "/fr-dvbt-multiplex-si.ts", file.parent_path());
-    std::ofstream(file) << "# the French multiplex R4\n" << rel << "  terrestrial 482000 7000\n";
-    const Loaded l = load(file.string());
-    fs::remove(file);
+    TempDir dir;
+    const std::string rel = fs::relative(kDir + "/fr-dvbt-multiplex-si.ts", dir.path);
+    std::ofstream(dir / "fr.broadcast") << "# the French multiplex R4\n"
+                                        << rel << "  terrestrial 482000 7000\n";
+    const Loaded l = load(dir / "fr.broadcast");
     // The capture's own transport (tsid 4) takes the file's tuning; the rule skips 482000.
     const std::map<int, uint32_t> want = {{1, 474000}, {2, 490000}, {3, 498000}, {4, 482000},
                                           {6, 506000}, {8, 514000}, {10, 522000}};

@@ -4,6 +4,7 @@
 #include <broadcast/TsWriter.h>
 #include <gtest/gtest.h>
 #include <receiver/Modules.h>
+#include "Captures.h"
 // clang-format off
 #include <dvbpsi/dvbpsi.h>
 #include <dvbpsi/descriptor.h>
@@ -11,10 +12,8 @@
 #include <dvbpsi/eit.h>
 // clang-format on
 
-#include <unistd.h>
 #include <algorithm>
 #include <cstdio>
-#include <filesystem>
 #include <fstream>
 #include <nlohmann/json.hpp>
 #include <set>
@@ -22,7 +21,7 @@
 #include <tuple>
 
 using namespace dvbmodel;
-namespace fs = std::filesystem;
+using namespace testdata;
 
 namespace {
 
@@ -41,13 +40,6 @@ std::string run(const std::string& command) {
     if (p != nullptr) pclose(p);
     return out;
 }
-
-struct TempDir {
-    fs::path path = fs::temp_directory_path() / ("tswriter-" + std::to_string(getpid()));
-    TempDir() { fs::create_directories(path); }
-    ~TempDir() { fs::remove_all(path); }
-    std::string operator/(const char* name) const { return (path / name).string(); }
-};
 
 void save(const std::string& path, const std::vector<uint8_t>& ts) {
     std::ofstream(path, std::ios::binary)
