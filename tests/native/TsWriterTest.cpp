@@ -41,11 +41,6 @@ std::string run(const std::string& command) {
     return out;
 }
 
-void save(const std::string& path, const std::vector<uint8_t>& ts) {
-    std::ofstream(path, std::ios::binary)
-            .write(reinterpret_cast<const char*>(ts.data()), ts.size());
-}
-
 // One line per program (number, PMT and PCR PIDs, name) and per stream (PID, stream type, what
 // its descriptors make of a private stream, languages), as ffprobe reads the file.
 std::set<std::string> probe(const std::string& file) {
@@ -155,7 +150,8 @@ TEST(TsWriter, EveryBuiltinTransportReadsBackToTheSameModelAndInFfprobe) {
             writeTransport(b, n, t, kStart, spanMs, ts, state, options);
             EXPECT_EQ(state.stats().sectionsDropped, 0u);
             if (ffprobe) {
-                save(dir / "tp.ts", ts);
+                std::ofstream(dir / "tp.ts", std::ios::binary)
+                        .write(reinterpret_cast<const char*>(ts.data()), ts.size());
                 EXPECT_EQ(probe(dir / "tp.ts"), expected(t)) << "transport " << t.tsid;
             }
             TsCapture c;
