@@ -33,6 +33,7 @@ TEST(Context, ResolvesUntilTheLastReleaseAndNeverHandsAValueOutTwice) {
         const jint ctx = dvbjni::contextBind(d);
         ASSERT_GT(ctx, 0);
         EXPECT_EQ(dvbjni::contextObject(ctx), d);
+        EXPECT_EQ(dvbjni::contextObject(first), nullptr);  // when its slot holds `d` too
         seen.push_back(ctx);
         dvbjni::contextRelease(d);
         EXPECT_EQ(dvbjni::contextObject(ctx), nullptr);
