@@ -6,7 +6,6 @@
 
 #include "Captures.h"
 #include "broadcast/Builtin.h"
-#include "broadcast/DvbSubtitle.h"
 #include "broadcast/DvbTeletext.h"
 #include "receiver/Teletext.h"
 
@@ -59,17 +58,13 @@ struct Zvbi {
     }
 };
 
-// The pages of one PID of a capture, `time` their PES's PTS in milliseconds.
+// The pages of one PID of a capture, but those of its last `skipLast` PES packets.
 std::vector<TeletextPage> decode(const char* name, uint16_t pid, TeletextDecoder& decoder,
                                  size_t skipLast) {
     const Packets pes = testdata::pes(name, pid);
     std::vector<TeletextPage> pages;
-    for (size_t i = 0; i + skipLast < pes.size(); ++i) {
-        const uint8_t* p = pes[i].data();
-        uint64_t pts = uint64_t{p[9] & 0x0Eu} << 29 | p[10] << 22 | (p[11] >> 1) << 15 |
-                       p[12] << 7 | p[13] >> 1;
-        decoder.feed(p, pes[i].size(), int64_t(pts / 90), pages);
-    }
+    for (size_t i = 0; i + skipLast < pes.size(); ++i)
+        decoder.feed(pes[i].data(), pes[i].size(), 0, pages);
     return pages;
 }
 

@@ -192,9 +192,10 @@ TEST(TsWriter, EveryBuiltinTransportReadsBackToTheSameModelAndInFfprobe) {
                 }
                 for (const TeletextPage& p : got.teletext) {
                     auto same = [&](const TeletextPage& m) {
-                        return m.number == p.number && m.subcode == p.subcode &&
-                               m.controlBits == p.controlBits && m.rows[1] == p.rows[1] &&
-                               m.rows[23] == p.rows[23] && m.links == p.links;
+                        return m.time + kTsDecodeDelayMs == p.time && m.number == p.number &&
+                               m.subcode == p.subcode && m.controlBits == p.controlBits &&
+                               m.rows[1] == p.rows[1] && m.rows[23] == p.rows[23] &&
+                               m.links == p.links;
                     };
                     EXPECT_TRUE(std::any_of(want.teletext.begin(), want.teletext.end(), same))
                             << want.id << " page " << std::hex << p.number;
