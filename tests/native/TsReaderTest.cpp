@@ -2,6 +2,7 @@
 // a segment reader made them, not this reader), and the broadcast setting's errors.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <ctime>
 #include <map>
 #include <set>
@@ -28,7 +29,6 @@ struct Loaded {
     Broadcast b;
     TsReadStats stats;
     std::map<std::tuple<int, int, int>, const Service*> services;  // onid, tsid, sid
-    std::map<std::pair<int, int>, const Transport*> transports;
 };
 
 Loaded load(const std::string& setting) {
@@ -36,19 +36,10 @@ Loaded load(const std::string& setting) {
     std::string error;
     EXPECT_TRUE(loadBroadcast(setting, 0, l.b, error, &l.stats)) << error;
     for (const Network& n : l.b.networks) {
-        for (const Transport& t : n.transports) {
-            l.transports[{t.onid, t.tsid}] = &t;
+        for (const Transport& t : n.transports)
             for (const Service& s : t.services) l.services[{t.onid, t.tsid, s.id}] = &s;
-        }
     }
     return l;
-}
-
-const Event* find(const Service* s, int id) {
-    for (const Event& e : s->events) {
-        if (e.id == id) return &e;
-    }
-    return nullptr;
 }
 
 }  // namespace
@@ -102,8 +93,9 @@ TEST(TsReader, FrenchMultiplexMatchesItsTruth) {
     auto check = [&](const json& svc, const json& e, int64_t duration, const json& name,
                      const json& text, const json& ext) {
         const Service* s = l.services.at({svc["onid"], svc["tsid"], svc["sid"]});
-        const Event* got = find(s, e["event_id"]);
-        ASSERT_NE(got, nullptr) << svc["sid"] << " " << e["event_id"];
+        const auto got = std::find_if(s->events.begin(), s->events.end(),
+                                      [&](const Event& x) { return x.id == e["event_id"]; });
+        ASSERT_NE(got, s->events.end()) << svc["sid"] << " " << e["event_id"];
         ids[s].insert(int(e["event_id"]));
         EXPECT_EQ(got->start, utc(e["start_utc"])) << e["event_id"];
         EXPECT_EQ(got->duration, duration) << e["event_id"];
@@ -270,11 +262,11 @@ TEST(TsReader, BroadcastFileTunesItsCaptureAndTheRuleTheRest) {
                                         << rel << "  terrestrial 482000 7000\n";
     const Loaded l = load(dir / "fr.broadcast");
     // The capture's own transport (tsid 4) takes the file's tuning; the rule skips 482000.
-    const std::map<int, uint32_t> want = {{1, 474000}, {2, 490000}, {3, 498000}, {4, 482000},
-                                          {6, 506000}, {8, 514000}, {10, 522000}};
-    for (const auto& [tsid, khz] : want) {
-        ASSERT_EQ(l.transports.count({8442, tsid}), 1u) << tsid;
-        EXPECT_EQ(l.transports.at({8442, tsid})->tuning.frequencyKHz, khz) << tsid;
-        EXPECT_EQ(l.transports.at({8442, tsid})->tuning.bandwidthKHz, tsid == 4 ? 7000u : 8000u);
-    }
+    std::map<int, std::pair<uint32_t, uint32_t>> got,  // tsid: kHz, bandwidth
+            want = {{1, {474000, 8000}},  {2, {490000, 8000}},  {3, {498000, 8000}},
+                    {4, {482000, 7000}},  {6, {506000, 8000}},  {8, {514000, 8000}},
+                    {10, {522000, 8000}}, {13, {530000, 8000}}, {15, {538000, 8000}}};
+    for (const Transport& t : l.b.networks.at(0).transports)
+        got[t.tsid] = {t.tuning.frequencyKHz, t.tuning.bandwidthKHz};
+    EXPECT_EQ(got, want);
 }
