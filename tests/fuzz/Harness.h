@@ -68,12 +68,8 @@ inline bool isModifiedUtf8(const std::string& s) {
             if ((s[i + k] & 0xC0) != 0x80) return false;
             value = value << 6 | (s[i + k] & 0x3F);
         }
-        if (value < (extra == 2   ? 0x800u
-                     : extra == 1 ? 0x80u
-                                  : 0u) &&
-            !(extra == 1 && value == 0)) {
-            return false;
-        }
+        const uint32_t least[] = {0, 0x80, 0x800};  // shorter forms are overlong; C0 80 is U+0000
+        if (value < least[extra] && !(extra == 1 && value == 0)) return false;
         i += 1 + extra;
     }
     return true;
@@ -89,16 +85,19 @@ inline Object* make(JNIEnv* e, Kind kind, std::string cls = "") {
     return gObjects.emplace_back(new Object{kind, std::move(cls)}).get();
 }
 
+// The object behind a local reference of the current call, if any.
+inline Object* find(const void* ref) {
+    for (const auto& o : gObjects) {
+        if (o.get() == ref) return o.get();
+    }
+    return nullptr;
+}
+
 // The object behind a live local reference of `kind`: anything else is misuse.
 inline Object* live(const void* ref, Kind kind) {
-    for (const auto& o : gObjects) {
-        if (o.get() == ref) {
-            FUZZ_CHECK(!o->deleted && o->kind == kind);
-            return o.get();
-        }
-    }
-    FUZZ_CHECK(!"a live local reference");
-    return nullptr;
+    Object* o = find(ref);
+    FUZZ_CHECK(o != nullptr && !o->deleted && o->kind == kind);
+    return o;
 }
 
 // A Java string from the input, any length, any characters (U+0000 and U+0080..U+00FF among
@@ -187,14 +186,9 @@ inline JNIEnv* jni() {
     t.ExceptionCheck = [](JNIEnv*) -> jboolean { return !gThrown.empty(); };
     t.ExceptionClear = [](JNIEnv*) { gThrown.clear(); };
     t.DeleteLocalRef = [](JNIEnv*, jobject ref) {
-        for (const auto& o : gObjects) {
-            if (o.get() == static_cast<void*>(ref)) {
-                FUZZ_CHECK(!o->deleted);
-                o->deleted = true;
-                return;
-            }
-        }
-        FUZZ_CHECK(ref == nullptr);
+        Object* o = find(ref);
+        FUZZ_CHECK(o != nullptr ? !o->deleted : ref == nullptr);
+        if (o != nullptr) o->deleted = true;
     };
     t.GetFieldID = fieldId;
     t.GetIntField = getInt;

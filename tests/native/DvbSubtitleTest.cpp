@@ -2,43 +2,23 @@
 #include <png.h>
 
 #include <cstdlib>
-#include <filesystem>
-#include <fstream>
-#include <iterator>
 #include <string>
 #include <vector>
 
-#include <unistd.h>
-
+#include "Captures.h"
 #include "Ycc.h"
 #include "broadcast/DvbSubtitle.h"
 
 using namespace dvbmodel;
-namespace fs = std::filesystem;
+using namespace testdata;
 
 namespace {
-
-using Packets = std::vector<std::vector<uint8_t>>;
 
 std::vector<DisplaySet> decode(DvbSubtitleDecoder& d, const Packets& pes) {
     std::vector<DisplaySet> out;
     for (const auto& p : pes) d.feed(p.data(), p.size(), out);
     return out;
 }
-
-Packets capture(const char* name, uint16_t pid) {
-    std::ifstream in(std::string(DVB_TESTDATA_DIR) + "/" + name, std::ios::binary);
-    std::vector<uint8_t> ts{std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
-    Packets pes;
-    PesAssembler a(pid);
-    a.feed(ts.data(), ts.size(), pes);
-    a.flush(pes);
-    return pes;
-}
-
-#define NEED_TESTDATA(name)                                      \
-    if (!fs::exists(std::string(DVB_TESTDATA_DIR) + "/" + name)) \
-    GTEST_SKIP() << "capture " << name << " absent: " DVB_TESTDATA_DIR " is not there"
 
 // The display set on its display: each placed region's pixels as the colours of its CLUT
 // (the default CLUT where the epoch defined none), by the library's BT.601 conversion. With a
@@ -158,29 +138,22 @@ DisplaySet sample() {
 }
 
 TEST(DvbSubtitle, CanalPlusCaptureMatchesItsTruthAndFfmpegRendering) {
-    NEED_TESTDATA("dvbsub-canalplus-cinema.ts");
+    NEED_CAPTURE("dvbsub-canalplus-cinema.ts");
     DvbSubtitleDecoder decoder(3, 4);
-    std::vector<DisplaySet> sets = decode(decoder, capture("dvbsub-canalplus-cinema.ts", 0x0157));
+    std::vector<DisplaySet> sets = decode(decoder, pes("dvbsub-canalplus-cinema.ts", 0x0157));
     ASSERT_EQ(sets.size(), 1u);
     const DisplaySet& s = sets[0];
     EXPECT_EQ(s.pts, 5826066156u);
     ASSERT_EQ(s.placements.size() * 10 + s.regions.size() * 100 + s.cluts.size(), 422u);
-    EXPECT_EQ(std::vector<int>({s.pageId, s.state, s.version, s.timeout, s.hasDisplay,
-                                s.displayWidth, s.displayHeight, s.windowed, s.placements[0].id,
-                                s.placements[0].x, s.placements[0].y, s.placements[1].id,
-                                s.placements[1].x, s.placements[1].y, s.cluts[0].id,
-                                s.cluts[0].version, s.cluts[1].id, s.cluts[1].version}),
-              std::vector<int>({3, 2, 2, 10, 1, 720, 576, 0, 0, 60, 460, 1, 60, 502, 1, 14, 2, 3}));
-    // Per region: id, width, height, depth (4-bit), CLUT, version, fill, then its objects.
-    std::vector<int> regions;
+    // What ffmpeg's rendering below does not show: page, state, versions, timeout, object ids.
+    std::vector<int> hidden = {s.pageId, s.state, s.version, s.timeout};
     for (const Region& r : s.regions) {
-        regions.insert(regions.end(),
-                       {r.id, r.width, r.height, r.depth, r.clutId, r.version, r.fill});
-        for (const ObjectRef& o : r.objects) regions.insert(regions.end(), {o.id, o.x, o.y});
+        hidden.insert(hidden.end(), {r.id, r.version});
+        for (const ObjectRef& o : r.objects) hidden.push_back(o.id);
     }
-    EXPECT_EQ(regions, std::vector<int>({0,  600, 42, 2,  1,   14,    1,   35439, 182, 0,   1,  600,
-                                         42, 2,   2,  14, 1,   35440, 204, 0,     2,   600, 42, 2,
-                                         1,  14,  1,  3,  600, 42,    2,   1,     14,  1}));
+    for (const Clut& c : s.cluts) hidden.insert(hidden.end(), {c.id, c.version});
+    EXPECT_EQ(hidden, std::vector<int>({3, 2, 2, 10, 0, 14, 35439, 1, 14, 35440, 2, 14, 3, 14, 1,
+                                        14, 2, 3}));
     const DvbSubtitleStats& stats = decoder.stats();
     EXPECT_EQ(stats.segments, 11u);
     EXPECT_EQ(stats.segmentsDropped + stats.objectsDropped + stats.runsClipped + stats.missingCluts,
@@ -194,13 +167,12 @@ TEST(DvbSubtitle, CanalPlusCaptureMatchesItsTruthAndFfmpegRendering) {
     // one of the CLUT readers: 2538 pixels of this set differ by 1 in a channel, none by more.
     // A misplaced pixel or a wrong CLUT index differs by far more.
     EXPECT_EQ(differences(ours, ffmpeg, 1), 0u);
-    EXPECT_GT(differences(ours, std::vector<uint32_t>(ours.size(), 0), 0), 7000u);
 }
 
 TEST(DvbSubtitle, DamagedCaptureKeepsItsSoundParts) {
-    NEED_TESTDATA("damaged-subtitles-teletext.ts");
+    NEED_CAPTURE("damaged-subtitles-teletext.ts");
     DvbSubtitleDecoder decoder(2, 2);
-    std::vector<DisplaySet> sets = decode(decoder, capture("damaged-subtitles-teletext.ts", 0x4B));
+    std::vector<DisplaySet> sets = decode(decoder, pes("damaged-subtitles-teletext.ts", 0x4B));
     ASSERT_EQ(sets.size(), 2u);
     const DisplaySet& s = sets[1];
     ASSERT_EQ(s.placements.size() * 10 + s.regions.size(), 11u);
@@ -304,8 +276,7 @@ TEST(DvbSubtitle, FfmpegRendersTheEncodedDisplaySet) {
     if (std::system("ffmpeg -version >/dev/null 2>&1") != 0) {
         GTEST_SKIP() << "ffmpeg is not on PATH (Debian package ffmpeg): no independent decoder";
     }
-    fs::path dir = fs::temp_directory_path() / ("dvbsub-" + std::to_string(::getpid()));
-    fs::create_directories(dir);
+    TempDir dir;
     std::vector<uint8_t> ts;
     section(ts, 0, {0x00, 0xB0, 0x0D, 0, 1, 0xC1, 0, 0, 0, 1, 0xE1, 0x00, 0xE8, 0xF9, 0x5E, 0x7D});
     // PMT: PCR and subtitles on PID 0x101, subtitling descriptor "fra", pages 3 and 4.
@@ -318,21 +289,20 @@ TEST(DvbSubtitle, FfmpegRendersTheEncodedDisplaySet) {
     uint8_t cc = 0;
     packetizePes(0x101, encodeDisplaySet(s, 3, 90000), cc, ts);
     packetizePes(0x101, encodeDisplaySet(clear, 3, 180000), cc, ts);
-    std::ofstream((dir / "sub.ts").string(), std::ios::binary)
+    std::ofstream(dir / "sub.ts", std::ios::binary)
             .write(reinterpret_cast<const char*>(ts.data()), ts.size());
-    std::string command = "cd " + dir.string() +
+    std::string command = "cd " + dir.path.string() +
                           " && ffmpeg -nostdin -loglevel error -y -i sub.ts -filter_complex "
                           "'[0:0]showinfo[s]' -map '[s]' -fps_mode passthrough f%03d.png";
     ASSERT_EQ(std::system(command.c_str()), 0) << command;
     std::vector<uint32_t> ours = compose(s);
     size_t frames = 0, matched = 0;
-    for (const auto& f : fs::directory_iterator(dir)) {
+    for (const auto& f : fs::directory_iterator(dir.path)) {
         if (f.path().extension() != ".png") continue;
         ++frames;
         // Same rule as for the capture: ffmpeg's own rounding, at most 1 per channel.
         matched += differences(ours, readPng(f.path().string()), 1) == 0;
     }
-    fs::remove_all(dir);
     // The display set, repeated by the frame-rate conversion, between empty frames.
     EXPECT_GT(frames, matched);
     EXPECT_GE(matched, 1u);

@@ -1,22 +1,19 @@
 #include <gtest/gtest.h>
 #include <libzvbi.h>
 
-#include <filesystem>
-#include <fstream>
 #include <map>
-#include <nlohmann/json.hpp>
 #include <sstream>
 
+#include "Captures.h"
 #include "broadcast/Builtin.h"
-#include "broadcast/DvbSubtitle.h"
 #include "broadcast/DvbTeletext.h"
 #include "receiver/Teletext.h"
 
 using namespace dvbmodel;
+using namespace testdata;
 
 namespace {
 
-using Packets = std::vector<std::vector<uint8_t>>;
 using Text = std::array<std::string, 25>;
 
 // A page's text with the national option of C12..C14 (C12 the highest bit), the header
@@ -61,40 +58,24 @@ struct Zvbi {
     }
 };
 
-// The pages of one PID of a capture, `time` their PES's PTS in milliseconds.
+// The pages of one PID of a capture, but those of its last `skipLast` PES packets.
 std::vector<TeletextPage> decode(const char* name, uint16_t pid, TeletextDecoder& decoder,
                                  size_t skipLast) {
-    std::ifstream in(std::string(DVB_TESTDATA_DIR) + "/" + name, std::ios::binary);
-    std::vector<uint8_t> ts{std::istreambuf_iterator<char>(in), {}};
-    Packets pes;
-    PesAssembler(pid).feed(ts.data(), ts.size(), pes);
+    const Packets pes = testdata::pes(name, pid);
     std::vector<TeletextPage> pages;
-    for (size_t i = 0; i + skipLast < pes.size(); ++i) {
-        const uint8_t* p = pes[i].data();
-        uint64_t pts = uint64_t{p[9] & 0x0Eu} << 29 | p[10] << 22 | (p[11] >> 1) << 15 |
-                       p[12] << 7 | p[13] >> 1;
-        decoder.feed(p, pes[i].size(), int64_t(pts / 90), pages);
-    }
+    for (size_t i = 0; i + skipLast < pes.size(); ++i)
+        decoder.feed(pes[i].data(), pes[i].size(), 0, pages);
     return pages;
 }
-
-nlohmann::json truth(const std::string& name) {
-    std::ifstream in(DVB_TESTDATA_DIR "/truth/" + name + ".json");
-    return nlohmann::json::parse(in)["teletext"][0];
-}
-
-#define NEED_TESTDATA(name)                                                   \
-    if (!std::filesystem::exists(std::string(DVB_TESTDATA_DIR) + "/" + name)) \
-    GTEST_SKIP() << "capture " << name << " absent: " DVB_TESTDATA_DIR " is not there"
 
 // The truth is libzvbi's text at level 1.5, where X/26 packets put diacritical marks on
 // capitals (no Latin national option has an accented capital): our level 1 has the base
 // letter. libzvbi reads a PES's lines when the next one starts, and reports decimal pages.
 TEST(DvbTeletext, DecodesArteAsLibzvbiDid) {
-    NEED_TESTDATA("teletext-arte.ts");
+    NEED_CAPTURE("teletext-arte.ts");
     TeletextDecoder decoder;
     const std::vector<TeletextPage> pages = decode("teletext-arte.ts", 0x042C, decoder, 1);
-    const auto zvbi = truth("teletext-arte");
+    const auto zvbi = truth("teletext-arte")["teletext"][0];
     std::map<std::string, std::vector<Text>> received;
     for (const TeletextPage& p : pages) {
         char number[8];
@@ -223,14 +204,15 @@ TEST(DvbTeletext, KeepsWhatIsSoundOfDamagedUnits) {
 // Bit errors everywhere: libzvbi completes no page of it; TSDuck's reading of its one subtitle
 // is what another decoder gives, and ours holds it.
 TEST(DvbTeletext, SurvivesTheDamagedCapture) {
-    NEED_TESTDATA("damaged-subtitles-teletext.ts");
+    NEED_CAPTURE("damaged-subtitles-teletext.ts");
     TeletextDecoder decoder;
     std::string text;
     for (const TeletextPage& p : decode("damaged-subtitles-teletext.ts", 0x3E, decoder, 0))
         for (const std::string& row : print(p)) text += row;
     // The subtitle's text lines follow its number and its times.
-    std::istringstream srt(truth("damaged-subtitles-teletext")["tsduck_reference_srt"]["content"]
-                                   .get<std::string>());
+    std::istringstream srt(
+            truth("damaged-subtitles-teletext")["teletext"][0]["tsduck_reference_srt"]["content"]
+                    .get<std::string>());
     int n = 0;
     for (std::string line; std::getline(srt, line);)
         EXPECT_TRUE(++n <= 2 || text.find(line) != std::string::npos) << line;

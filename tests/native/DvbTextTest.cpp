@@ -2,24 +2,14 @@
 #if DVB_RECEIVER
 #include <broadcast/DvbText.h>
 #include <gtest/gtest.h>
+#include "Captures.h"
 
-#include <filesystem>
-#include <fstream>
-#include <nlohmann/json.hpp>
 #include <sstream>
 
 using namespace dvbmodel;
+using testdata::unhex;
 
 namespace {
-
-// Bytes written in hex, spaces between them for the eye.
-std::string unhex(std::string_view h) {
-    std::string b;
-    for (size_t i = 0; i + 1 < h.size(); i += h[i] == ' ' ? 1 : 2) {
-        if (h[i] != ' ') b += char(std::stoi(std::string(h.substr(i, 2)), nullptr, 16));
-    }
-    return b;
-}
 
 // Every table: its selector, a round trip, and cuts at every length that re-encode as they were.
 TEST(DvbText, EveryTableRoundTrips) {

@@ -34,6 +34,12 @@ long slotOf(F member) {
     } while (0)
 #define S(op) slotOf(&M::op)
 
+// RefBase's hooks are protected: a subclass may name them.
+struct Probe : android::RefBase {
+    static long first() { return slotOf(&Probe::onFirstRef); }
+    static long last() { return slotOf(&Probe::onLastWeakRef); }
+};
+
 TEST(Vtable, EveryModuleOperationKeepsItsPlace) {
     EXPECT_ORDER(Scnm, S(Reserved1), S(Init), S(Open), S(Close), S(Start), S(Stop), S(GetStatus),
                  S(CreateServiceList), S(Reserved9), S(CreateNetworkList), S(Reserved11),
@@ -51,15 +57,6 @@ TEST(Vtable, EveryModuleOperationKeepsItsPlace) {
                  S(GetVideoPos), S(SetWakeup));
     EXPECT_ORDER(Subttl, S(Init), S(Start), S(Stop), S(GetData));
     EXPECT_ORDER(Teltxt, S(Start), S(Stop), S(SetData), S(GetData));
-}
-
-// RefBase's hooks are protected: a subclass may name them.
-struct Probe : android::RefBase {
-    static long first() { return slotOf(&Probe::onFirstRef); }
-    static long last() { return slotOf(&Probe::onLastWeakRef); }
-};
-
-TEST(Vtable, RefBaseAndListenerSlots) {
     EXPECT_EQ(Probe::first(), 2);
     EXPECT_EQ(Probe::last(), 5);
     // DVBListener has RefBase as a virtual base: its own notify is its first slot.
