@@ -94,8 +94,10 @@ std::string describe(const Service& s, int64_t from, int64_t to) {
     for (uint16_t ca : s.caSystems) add(ca);
     for (const Component& c : s.components) {
         d += "\n  component " + c.language + ' ';
+        // A sequence header gives MPEG video's size; H.264's is in its parameter sets, not read.
         add(int(c.kind), c.pid, c.streamType, c.ac3, c.eac3, c.subtitlingType, c.compositionPageId,
-            c.ancillaryPageId);
+            c.ancillaryPageId, c.frameRateMilli, c.streamType == 0x02 ? c.width : 0,
+            c.streamType == 0x02 ? c.height : 0);
         for (const TeletextRef& p : c.pages) add(p.type, p.magazine, p.page);
     }
     // The schedule goes out for 8 days from the UTC midnight of the span.
