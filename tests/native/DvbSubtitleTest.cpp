@@ -240,6 +240,8 @@ TEST(DvbSubtitle, DamagedSegmentsAreDroppedAndCounted) {
              &DvbSubtitleStats::missingCluts, true},
             {"object field longer than its segment", bodyOf(0x13, 1) + 3, 0xFF, good.size(),
              &DvbSubtitleStats::objectsDropped, false},
+            {"object of a reserved coding method", bodyOf(0x13, 1) + 2, 0x0C, good.size(),
+             &DvbSubtitleStats::objectsDropped, false},
             {"object placed past the region's edge", bodyOf(0x11, 1) + 12, 0x02, good.size(),
              &DvbSubtitleStats::runsClipped, false},
             {"last object without sync, cut short", bodyOf(0x13, 2) - 6, 0x0E, bodyOf(0x13, 2) + 40,

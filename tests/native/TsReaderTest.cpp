@@ -199,10 +199,12 @@ TEST(TsReader, SettingErrorsNameTheFileAndLine) {
         return dir / name;
     };
     const std::string notTs = write("notes.ts", "Good grief, this is text\n");
-    const std::string absent = dir / "absent.ts", x = dir / "x.ts";
+    const std::string absent = dir / "absent.ts", x = dir / "x.ts", empty = dir / "empty";
+    std::filesystem::create_directory(empty);
     std::vector<std::pair<std::string, std::string>> cases = {
             {notTs, notTs + ": not an MPEG transport stream"},
             {absent, absent + ": no such file or folder"},
+            {empty, empty + ": folder holds no .ts capture"},
             {write("x.broadcast", "x.ts   # a capture\n"), x + ": cannot read"},
     };
     const std::pair<const char*, const char*> files[] = {
@@ -212,7 +214,7 @@ TEST(TsReader, SettingErrorsNameTheFileAndLine) {
             {"x.ts dab 1\n", ":1: unknown delivery 'dab'"},
             {"x.ts terrestrial 0\n", ":1: bad frequency '0'"},
             {"x.ts terrestrial 586000 8500\n", ":1: bad bandwidth"},
-            {"x.ts cable 306000 6900000 qam1024\n", ":1: bad modulation"},
+            {"x.ts cable 306000 6900000 qam1024\n", ":1: bad modulation 'qam1024' (qam16..qam256)"},
             {"x.ts satellite 11494000 22000000 x\n", ":1: bad polarization"},
             {"x.ts satellite 11494000 22000000 h 19.2N\n", ":1: bad orbital position"},
             {"x.ts terrestrial 586000 8000 9\n", ":1: too many fields"},
