@@ -172,6 +172,90 @@ const Event* eventAfter(const Service& svc, int64_t seconds) {
     return nullptr;
 }
 
+// MSB-first bits into a byte vector, for the picture below.
+class BitWriter {
+public:
+    explicit BitWriter(std::vector<uint8_t>& out) : out_(out) {}
+    void put(uint32_t value, int bits) {
+        for (int i = bits - 1; i >= 0; --i) {
+            acc_ = static_cast<uint8_t>(acc_ << 1 | (value >> i & 1));
+            if (++n_ == 8) out_.push_back(acc_), acc_ = 0, n_ = 0;
+        }
+    }
+    // Zero bits up to the next byte.
+    void align() {
+        if (n_ > 0) put(0, 8 - n_);
+    }
+    void start(uint8_t code) {
+        align();
+        out_.insert(out_.end(), {0x00, 0x00, 0x01, code});
+    }
+
+private:
+    std::vector<uint8_t>& out_;
+    uint8_t acc_ = 0;
+    int n_ = 0;
+};
+
+// An MPEG-2 intra picture (Main profile, 4:2:0, progressive) of flat 16x16 macroblocks, each
+// block coded by its DC alone: 75% colour bars over the top two thirds, a band in a colour of
+// `hue` (the PID's), a grey ramp at the bottom. The sequence header is the caller's; this writes
+// the sequence extension, a closed GOP, the picture and its slices (ISO/IEC 13818-2).
+void writeTestCard(std::vector<uint8_t>& out, uint16_t width, uint16_t height, uint16_t hue) {
+    // Y, Cb, Cr of white, yellow, cyan, green, magenta, red, blue, black (ITU-R BT.601).
+    static constexpr uint8_t kBars[8][3] = {{180, 128, 128}, {162, 44, 142}, {131, 156, 44},
+                                            {112, 72, 58},   {84, 184, 198}, {65, 100, 212},
+                                            {35, 212, 114},  {16, 128, 128}};
+    // dct_dc_size_luminance and _chrominance codes for sizes 0 to 8: code, length.
+    static constexpr uint8_t kLuma[9][2] = {{4, 3},  {0, 2},  {1, 2},  {5, 3},  {6, 3},
+                                            {14, 4}, {30, 5}, {62, 6}, {126, 7}};
+    static constexpr uint8_t kChroma[9][2] = {{0, 2},  {1, 2},  {2, 2},   {6, 3},  {14, 4},
+                                              {30, 5}, {62, 6}, {126, 7}, {254, 8}};
+    BitWriter w(out);
+    w.start(0xB5);  // sequence extension: Main@Main, progressive, 4:2:0, low delay
+    w.put(0x1, 4), w.put(0x48, 8), w.put(1, 1), w.put(1, 2), w.put(0, 4), w.put(0, 12);
+    w.put(1, 1), w.put(0, 8), w.put(1, 1), w.put(0, 7);
+    w.start(0xB8);  // GOP: time code 0 (its marker bit set), closed
+    w.put(0, 12), w.put(1, 1), w.put(0, 12), w.put(1, 1), w.put(0, 1);
+    w.start(0x00);  // picture: temporal reference 0, intra, vbv_delay unknown
+    w.put(0, 10), w.put(1, 3), w.put(0xFFFF, 16), w.put(0, 1);
+    w.start(0xB5);  // picture coding extension: frame, DC precision 8 bits, progressive
+    w.put(0x8, 4), w.put(0xFFFF, 16), w.put(0, 2), w.put(3, 2), w.put(0, 1), w.put(1, 1);
+    w.put(0, 5), w.put(1, 1), w.put(1, 1), w.put(0, 1);
+    const int columns = (width + 15) / 16, rows = (height + 15) / 16;
+    for (int row = 0; row < rows; ++row) {
+        w.start(static_cast<uint8_t>(row + 1));
+        w.put(8, 5), w.put(0, 1);  // quantiser scale (DC does not use it), no extra
+        int predictor[3] = {128, 128, 128};
+        for (int column = 0; column < columns; ++column) {
+            uint8_t ycc[3];
+            if (row * 3 < rows * 2) {
+                memcpy(ycc, kBars[column * 8 / columns], 3);
+            } else if (row * 6 < rows * 5) {
+                ycc[0] = 128, ycc[1] = uint8_t(64 + hue * 37 % 128);
+                ycc[2] = uint8_t(64 + hue * 91 % 128);
+            } else {
+                ycc[0] = uint8_t(16 + column * 219 / std::max(1, columns - 1)), ycc[1] = 128,
+                ycc[2] = 128;
+            }
+            w.put(1, 1), w.put(1, 1);  // the next macroblock, intra
+            for (int block = 0; block < 6; ++block) {
+                const int c = block < 4 ? 0 : block - 3;
+                const int diff = ycc[c] - predictor[c];
+                predictor[c] = ycc[c];
+                int size = 0;
+                while ((std::abs(diff) >> size) != 0) ++size;
+                const uint8_t* code = c == 0 ? kLuma[size] : kChroma[size];
+                w.put(code[0], code[1]);
+                if (size > 0)
+                    w.put(static_cast<uint32_t>(diff > 0 ? diff : diff + (1 << size) - 1), size);
+                w.put(2, 2);  // end of block
+            }
+        }
+    }
+    w.align();
+}
+
 int64_t frameTicks(const Component& c) {
     return c.frameRateMilli > 0 ? int64_t{90000} * 1000 / c.frameRateMilli : 3600;
 }
@@ -886,8 +970,23 @@ void TsWriter::pes(uint16_t pid, uint8_t streamId, uint64_t pts, size_t payload,
                                  static_cast<uint8_t>(0x30 | rate),
                                  static_cast<uint8_t>(bits >> 10),
                                  static_cast<uint8_t>(bits >> 2),
-                                 static_cast<uint8_t>((bits & 3) << 6 | 0x20),
-                                 0x00};
+                                 static_cast<uint8_t>((bits & 3) << 6 | 0x20 | 112 >> 5),
+                                 static_cast<uint8_t>((112 & 31) << 3)};  // VBV 112 x 16 kbit
+        // Every frame a test card where the bit rate carries one (the PES header goes in front
+        // of the card kept for the PID, so that the card is written without a copy of its own).
+        auto card = std::find_if(st_.pictures_.begin(), st_.pictures_.end(),
+                                 [pid](const auto& p) { return p.first == pid; });
+        if (card == st_.pictures_.end() && h <= 2800) {
+            std::vector<uint8_t> bytes(14);
+            bytes.insert(bytes.end(), seq, seq + sizeof seq);
+            writeTestCard(bytes, static_cast<uint16_t>(w), static_cast<uint16_t>(h), c.pid);
+            st_.pictures_.emplace_back(pid, std::move(bytes));
+            card = st_.pictures_.end() - 1;
+        }
+        if (card != st_.pictures_.end() && card->second.size() <= 14 + payload) {
+            memcpy(card->second.data(), head, 14);
+            return packetize(pid, card->second.data(), card->second.size(), 14 + payload);
+        }
         memcpy(head + headLen, seq, sizeof seq);
         headLen += sizeof seq;
     } else if (c.kind == Kind::Video && c.streamType == 0x1B && payload >= 12) {

@@ -46,7 +46,8 @@ struct TsWriterOptions {
     // of that one program and its PMT; no other table. Null: the whole transport.
     const Service* only = nullptr;
     // Bits per second of each video component's PES payload.
-    uint32_t videoBitRate = 1000000;
+    // Video bits per second; at 2 Mbit/s an SD MPEG video frame carries the test card below.
+    uint32_t videoBitRate = 2000000;
 };
 
 // What joins consecutive spans: the continuity counter of every PID and the version of every
@@ -77,6 +78,8 @@ private:
     std::array<uint8_t, 8192> continuity_{};
     std::vector<Version> versions_;
     std::vector<Due> due_;  // scratch: what a span sends, in time order
+    // The test card of each MPEG video PID: PES header room, sequence header, intra picture.
+    std::vector<std::pair<uint16_t, std::vector<uint8_t>>> pictures_;
     TsWriterStats stats_;
 };
 

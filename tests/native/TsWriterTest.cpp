@@ -350,3 +350,47 @@ TEST(TsRecording, TimeShiftRecordsTheServiceAndADumpTheTransponder) {
 }
 
 }  // namespace
+
+// An SD MPEG video frame at the default bit rate carries a test card: ffmpeg decodes its 75%
+// colour bars (ITU-R BT.601 values) and its grey ramp from 16 to 235.
+TEST(TsWriter, MpegVideoCarriesATestCardThatFfmpegDecodes) {
+    NEED_FFPROBE();
+    Broadcast b = builtinBroadcast(kStart / 1000);
+    const Network* net = nullptr;
+    const Service* svc = nullptr;
+    for (const Network& n : b.networks)
+        for (const Transport& t : n.transports)
+            for (const Service& s : t.services)
+                if (!svc && !s.components.empty() && s.components[0].streamType == 0x02)
+                    net = &n, svc = &s;
+    ASSERT_NE(svc, nullptr);
+    const Transport& tp = *std::find_if(
+            net->transports.begin(), net->transports.end(),
+            [&](auto& t) { return &t.services.front() <= svc && svc <= &t.services.back(); });
+    TsWriterOptions options;
+    options.only = svc;
+    std::vector<uint8_t> ts;
+    TsWriterState state;
+    writeTransport(b, *net, tp, kStart, 1000, ts, state, options);
+    TempDir dir;
+    std::ofstream(dir / "card.ts", std::ios::binary)
+            .write(reinterpret_cast<const char*>(ts.data()), ts.size());
+    const std::string yuv = run("ffmpeg -v error -i '" + (dir / "card.ts") +
+                                "' -map 0:v:0 -frames:v 1 -f rawvideo -pix_fmt yuv420p -");
+    const int w = 720, h = 576;
+    ASSERT_EQ(yuv.size(), size_t(w * h * 3 / 2));
+    auto at = [&](int x, int y) {
+        const size_t chroma = size_t(y / 2 * w / 2 + x / 2);
+        return std::array<int, 3>{uint8_t(yuv[size_t(y * w + x)]), uint8_t(yuv[w * h + chroma]),
+                                  uint8_t(yuv[w * h * 5 / 4 + chroma])};
+    };
+    const std::array<int, 3> bars[] = {{180, 128, 128}, {162, 44, 142}, {131, 156, 44},
+                                       {112, 72, 58},   {84, 184, 198}, {65, 100, 212},
+                                       {35, 212, 114},  {16, 128, 128}};
+    std::vector<std::array<int, 3>> got, want(std::begin(bars), std::end(bars));
+    for (int i = 0; i < 8; ++i) got.push_back(at((2 * i + 1) * w / 16, 40));
+    want.push_back({16, 128, 128}), want.push_back({235, 128, 128});
+    got.push_back(at(8, h - 8)), got.push_back(at(w - 8, h - 8));
+    for (size_t i = 0; i < want.size(); ++i)
+        for (int k = 0; k < 3; ++k) EXPECT_NEAR(got[i][k], want[i][k], 2) << i << ' ' << k;
+}
