@@ -226,15 +226,7 @@ TEST_F(ReceiverTest, PositionerMovesAtMotorSpeedWithinItsLimits) {
     double angle = usalsAngle(19.2, {0.0, 51.5});
     EXPECT_NEAR(angle, 21.15, 0.01);
     int64_t travel = std::llround(angle / kMotorDegreesPerSecond * 1000);
-    ASSERT_EQ(cfg->GotoSatellite(0, 192, 0, 515), kOk);
-    EXPECT_EQ(cfg->TryTune(0, &usals), kErrNoSignal);
-    // 0.45 degrees short of the satellite, then there.
-    advance(travel - 300);
-    EXPECT_EQ(cfg->TryTune(0, &usals), kErrNoSignal);
-    advance(300);
-    EXPECT_EQ(cfg->TryTune(0, &usals), kOk);
-    EXPECT_EQ(take(kEvtPositioner), (Events{{kEvtPositioner, 0, int(std::lround(angle * 10))}}));
-
+    auto tune = [&] { return cfg->TryTune(0, &usals); };
     // Each step: the operation, its result, then how long the motor runs and where it stops.
     const struct {
         const char* what;
@@ -243,6 +235,10 @@ TEST_F(ReceiverTest, PositionerMovesAtMotorSpeedWithinItsLimits) {
         int64_t runs;
         int tenths;
     } steps[] = {
+            {"to 19.2E", [&] { return cfg->GotoSatellite(0, 192, 0, 515) | tune(); }, kErrNoSignal,
+             travel - 300, -1},
+            {"0.45 degrees short", tune, kErrNoSignal, 300, int(std::lround(angle * 10))},
+            {"there", tune, kOk, 0, -1},
             {"reset to the reference", [&] { return cfg->Reset(0); }, kOk, travel, 0},
             {"50 steps east", [&] { return cfg->Drive(0, 0, 2, 50); }, kOk, 3333, 50},
             {"east limit here", [&] { return cfg->SetLimit(0, 0); }, kOk, 0, -1},
