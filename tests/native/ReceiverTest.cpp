@@ -226,15 +226,7 @@ TEST_F(ReceiverTest, PositionerMovesAtMotorSpeedWithinItsLimits) {
     double angle = usalsAngle(19.2, {0.0, 51.5});
     EXPECT_NEAR(angle, 21.15, 0.01);
     int64_t travel = std::llround(angle / kMotorDegreesPerSecond * 1000);
-    ASSERT_EQ(cfg->GotoSatellite(0, 192, 0, 515), kOk);
-    EXPECT_EQ(cfg->TryTune(0, &usals), kErrNoSignal);
-    // 0.45 degrees short of the satellite, then there.
-    advance(travel - 300);
-    EXPECT_EQ(cfg->TryTune(0, &usals), kErrNoSignal);
-    advance(300);
-    EXPECT_EQ(cfg->TryTune(0, &usals), kOk);
-    EXPECT_EQ(take(kEvtPositioner), (Events{{kEvtPositioner, 0, int(std::lround(angle * 10))}}));
-
+    auto tune = [&] { return cfg->TryTune(0, &usals); };
     // Each step: the operation, its result, then how long the motor runs and where it stops.
     const struct {
         const char* what;
@@ -243,6 +235,10 @@ TEST_F(ReceiverTest, PositionerMovesAtMotorSpeedWithinItsLimits) {
         int64_t runs;
         int tenths;
     } steps[] = {
+            {"to 19.2E", [&] { return cfg->GotoSatellite(0, 192, 0, 515) | tune(); }, kErrNoSignal,
+             travel - 300, -1},
+            {"0.45 degrees short", tune, kErrNoSignal, 300, int(std::lround(angle * 10))},
+            {"there", tune, kOk, 0, -1},
             {"reset to the reference", [&] { return cfg->Reset(0); }, kOk, travel, 0},
             {"50 steps east", [&] { return cfg->Drive(0, 0, 2, 50); }, kOk, 3333, 50},
             {"east limit here", [&] { return cfg->SetLimit(0, 0); }, kOk, 0, -1},
@@ -275,6 +271,7 @@ TEST_F(ReceiverTest, PositionerMovesAtMotorSpeedWithinItsLimits) {
     }
 }
 
+// A scan stopped midway (stopAt > 0) keeps what it found and reports no completion.
 TEST_F(ReceiverTest, EachKindOfScanFindsItsServicesInItsTime) {
     const struct {
         const char* what;
@@ -282,19 +279,21 @@ TEST_F(ReceiverTest, EachKindOfScanFindsItsServicesInItsTime) {
         P fe;
         std::set<int> services;
         size_t transponders;
-        int64_t millis;
+        int64_t millis, stopAt;
     } cases[] = {
-            {"one transponder", kScanSingle, sat(12551500, 1), {28006, 28007, 28008}, 1, 1900},
+            {"one transponder", kScanSingle, sat(12551500, 1), {28006, 28007, 28008}, 1, 1900, 0},
             {"network",
              kScanNetwork,
              sat(11493750, 0),
              {10301, 10302, 28006, 28007, 28008},
              2,
-             4300},
-            {"nothing there", kScanSingle, sat(11000000, 0), {}, 0, 1000},
-            {"terrestrial band", kScanFullBand, terrestrial(0), {257, 258, 513, 514}, 2, 15400},
-            {"cable band", kScanFullBand, cable(0), {101, 102, 201, 202}, 2, 18800},
-            {"satellite at 13.0E", kScanFullBand, sat(0, 0, 130), {5001, 5002}, 1, 13900},
+             4300,
+             0},
+            {"network stopped", kScanNetwork, sat(11493750, 0), {10301, 10302}, 1, 5000, 3000},
+            {"nothing there", kScanSingle, sat(11000000, 0), {}, 0, 1000, 0},
+            {"terrestrial band", kScanFullBand, terrestrial(0), {257, 258, 513, 514}, 2, 15400, 0},
+            {"cable band", kScanFullBand, cable(0), {101, 102, 201, 202}, 2, 18800, 0},
+            {"satellite at 13.0E", kScanFullBand, sat(0, 0, 130), {5001, 5002}, 1, 13900, 0},
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.what);
@@ -305,19 +304,27 @@ TEST_F(ReceiverTest, EachKindOfScanFindsItsServicesInItsTime) {
         start.fe = c.fe;
         start.scanType = c.type;
         ASSERT_EQ(scnm->Start(h, &start), kOk);
-        advance(c.millis - 1);
+        EXPECT_EQ(scnm->Start(h, &start), kErrBusy);
+        if (c.stopAt) {
+            advance(c.stopAt);
+            EXPECT_EQ(scnm->Stop(h), kOk);
+        }
+        const bool stopped = c.stopAt > 0;
+        advance(c.millis - c.stopAt - 1);
         SCNM_GetStatus st{};
         scnm->GetStatus(h, &st);
-        EXPECT_EQ(st.result, kScanRunning);
+        EXPECT_EQ(st.result, stopped ? kScanStopped : kScanRunning);
         EXPECT_EQ(take(kEvtScanComplete), Events{});
         advance(1);
         scnm->GetStatus(h, &st);
-        EXPECT_EQ(std::make_tuple(st.result, st.sfStatus), std::make_tuple(kScanDone, 100));
+        EXPECT_EQ(std::make_tuple(st.result, st.sfStatus),
+                  std::make_tuple(stopped ? kScanStopped : kScanDone, stopped ? 50 : 100));
         auto progress = take(kEvtScanProgress);
         ASSERT_FALSE(progress.empty());
-        EXPECT_EQ(progress.back(), (std::array<int, 3>{kEvtScanProgress, h, 100}));
+        EXPECT_EQ(progress.back(), (std::array<int, 3>{kEvtScanProgress, h, st.sfStatus}));
         EXPECT_TRUE(std::is_sorted(progress.begin(), progress.end()));
-        EXPECT_EQ(take(kEvtScanComplete), (Events{{kEvtScanComplete, h, int(c.services.size())}}));
+        EXPECT_EQ(take(kEvtScanComplete),
+                  (stopped ? Events{} : Events{{kEvtScanComplete, h, int(c.services.size())}}));
 
         SCNM_ServiceInfo* svc = nullptr;
         EXPECT_EQ(scnm->CreateServiceList(h, &svc), static_cast<int32_t>(c.services.size()));
@@ -335,25 +342,6 @@ TEST_F(ReceiverTest, EachKindOfScanFindsItsServicesInItsTime) {
         EXPECT_EQ(nets, c.transponders);
         EXPECT_EQ(scnm->Close(h), kOk);
     }
-}
-
-TEST_F(ReceiverTest, AStoppedScanKeepsWhatItFound) {
-    SCNM_OpenSettings open{0, 0};
-    int32_t h = scnm->Open(&open);
-    SCNM_StartSettings start{};
-    start.fe = sat(11493750, 0);
-    start.scanType = kScanNetwork;
-    ASSERT_EQ(scnm->Start(h, &start), kOk);
-    EXPECT_EQ(scnm->Start(h, &start), kErrBusy);
-    advance(3000);
-    EXPECT_EQ(scnm->Stop(h), kOk);
-    advance(5000);
-    SCNM_GetStatus st{};
-    scnm->GetStatus(h, &st);
-    SCNM_ServiceInfo* svc = nullptr;
-    EXPECT_EQ(std::make_tuple(st.result, st.sfStatus, scnm->CreateServiceList(h, &svc)),
-              std::make_tuple(kScanStopped, 50, 2));
-    EXPECT_EQ(take(kEvtScanComplete), Events{});
 }
 
 TEST_F(ReceiverTest, AStreamPlaysWhatTheTransponderCarries) {
