@@ -4,7 +4,6 @@ import static org.junit.jupiter.api.Assertions.*;
 import static org.junit.jupiter.api.Assumptions.assumeTrue;
 
 import java.lang.reflect.*;
-import java.time.Duration;
 import java.util.*;
 import org.junit.jupiter.api.Test;
 import org.junit.jupiter.params.ParameterizedTest;
@@ -16,8 +15,6 @@ import org.junit.jupiter.params.provider.*;
  * reaches a module, and each writes exactly its class's lines.
  */
 class FailureTest extends SpyTestBase {
-    static final Duration NO_HANG = Duration.ofSeconds(60); // a start-up wait that should not be
-
     static List<Method> natives(Class<?> cls) {
         List<Method> out = new ArrayList<>();
         for (Method m : cls.getDeclaredMethods()) {
