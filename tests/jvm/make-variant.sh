@@ -1,19 +1,18 @@
 #!/usr/bin/env bash
 # make-variant.sh JAVAC SRC_DIR OUT_DIR MODE: compiles the API classes into OUT_DIR with one
-# alteration, so that a load-failure check can run on them.
+# alteration, so that a load-failure check can run on them. A mode no-X-class or no-X-field
+# names the API class X in lower case.
 set -euo pipefail
 javac=$1 src=$2 out=$3 mode=$4
 tmp=$(mktemp -d)
 trap 'rm -rf "$tmp"' EXIT
 cp "$src"/*.java "$tmp"/
-rename_context() { sed -i 's/\bmNativeContext\b/mOtherContext/g' "$tmp/$1.java"; }
+cls=${mode#no-}
+cls=${cls%-*}
+[ "$cls" = dvb ] && cls=DVB || cls=${cls^}
 case $mode in
-  ok | no-scnm-class | no-cfg-class | no-subttl-class) ;;
-  no-scnm-field) rename_context Scnm ;;
-  no-strm-field) rename_context Strm ;;
-  no-cfg-field) rename_context Cfg ;;
-  no-teltxt-field) rename_context Teltxt ;;
-  no-dvb-field) rename_context DVB ;;
+  ok | no-*-class) ;;
+  no-*-field) sed -i 's/\bmNativeContext\b/mOtherContext/g' "$tmp/$cls.java" ;;
   no-post-event) sed -i 's/\bpostEventFromNative\b/postEventRenamed/g' "$tmp/DVB.java" ;;
   no-fields)  # every field of every record class renamed
     sed -i -E 's/^(        public (int|long|String|byte\[\]|int\[\]) )([A-Za-z_0-9]+);/\1gone_\3;/' \
@@ -24,7 +23,5 @@ rm -rf "$out"
 mkdir -p "$out"
 "$javac" --release 8 -nowarn -d "$out" "$tmp"/*.java
 case $mode in
-  no-scnm-class) rm -f "$out"/android/DVB/Scnm.class "$out"/android/DVB/Scnm\$*.class ;;
-  no-cfg-class) rm -f "$out"/android/DVB/Cfg.class "$out"/android/DVB/Cfg\$*.class ;;
-  no-subttl-class) rm -f "$out"/android/DVB/Subttl.class "$out"/android/DVB/Subttl\$*.class ;;
+  no-*-class) rm -f "$out/android/DVB/$cls.class" "$out/android/DVB/$cls"\$*.class ;;
 esac

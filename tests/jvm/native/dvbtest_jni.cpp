@@ -19,6 +19,7 @@
 #include <cstring>
 #include <mutex>
 #include <string>
+#include <type_traits>
 #include <vector>
 
 namespace {
@@ -44,7 +45,8 @@ void captureLog(const __android_logger_data* data, const char* message) {
 
 // ---- global reference tracking ----------------------------------------------------------
 // A copy of a thread's JNI function table with NewGlobalRef and DeleteGlobalRef wrapped. It
-// is installed on the test thread and on every service thread as it attaches.
+// is installed on the thread that loads this library (the test thread) and on every service
+// thread as it attaches; other Java threads are not watched.
 JNINativeInterface gHooked;
 const JNINativeInterface* gOriginal = nullptr;
 jclass gClassClass = nullptr;
@@ -71,8 +73,18 @@ void JNICALL hookedDeleteGlobalRef(JNIEnv* env, jobject ref) {
 }
 
 void hookThread(JNIEnv* env) {
-    if (gOriginal == nullptr) return;
     env->functions = &gHooked;
+}
+
+void trackGlobalRefs(JNIEnv* env) {
+    ScopedLocalRef<jclass> cls(env, env->FindClass("java/lang/Class"));
+    gClassClass = static_cast<jclass>(env->NewGlobalRef(cls.get()));
+    gOriginal = env->functions;
+    gHooked = *env->functions;
+    gHooked.NewGlobalRef = hookedNewGlobalRef;
+    gHooked.DeleteGlobalRef = hookedDeleteGlobalRef;
+    dvbspy::setAttachHook(hookThread);
+    hookThread(env);
 }
 
 // ---- natives of android.DVB.Spy ---------------------------------------------------------
@@ -146,33 +158,34 @@ void Spy_setOut(JNIEnv* env, jclass, jstring op, jint arg, jint offset, jbyteArr
                    std::vector<uint8_t>(p, p + b.size()));
 }
 
+// The elements of a Java array of byte arrays or strings, or false (an exception pending).
+template <typename T>
+bool elements(JNIEnv* env, jobjectArray array, std::vector<T>& out) {
+    for (jsize i = 0, n = env->GetArrayLength(array); i < n; ++i) {
+        ScopedLocalRef<jobject> e(env, env->GetObjectArrayElement(array, i));
+        if constexpr (std::is_same_v<T, std::string>) {
+            ScopedUtfChars s(env, static_cast<jstring>(e.get()));
+            if (s.c_str() == nullptr) return false;
+            out.emplace_back(s.c_str());
+        } else {
+            ScopedByteArrayRO b(env, static_cast<jbyteArray>(e.get()));
+            if (b.get() == nullptr) return false;
+            const auto* p = reinterpret_cast<const uint8_t*>(b.get());
+            out.emplace_back(p, p + b.size());
+        }
+    }
+    return true;
+}
+
 void Spy_setList(JNIEnv* env, jclass, jstring op, jobjectArray nodes) {
     ScopedUtfChars name(env, op);
-    if (name.c_str() == nullptr) return;
     std::vector<std::vector<uint8_t>> list;
-    jsize n = env->GetArrayLength(nodes);
-    for (jsize i = 0; i < n; ++i) {
-        ScopedLocalRef<jbyteArray> node(
-                env, static_cast<jbyteArray>(env->GetObjectArrayElement(nodes, i)));
-        ScopedByteArrayRO b(env, node.get());
-        if (b.get() == nullptr) return;
-        const auto* p = reinterpret_cast<const uint8_t*>(b.get());
-        list.emplace_back(p, p + b.size());
-    }
-    dvbspy::setList(name.c_str(), list);
+    if (name.c_str() != nullptr && elements(env, nodes, list)) dvbspy::setList(name.c_str(), list);
 }
 
 void Spy_omit(JNIEnv* env, jclass, jobjectArray modules) {
     std::vector<std::string> names;
-    jsize n = env->GetArrayLength(modules);
-    for (jsize i = 0; i < n; ++i) {
-        ScopedLocalRef<jstring> s(env,
-                                  static_cast<jstring>(env->GetObjectArrayElement(modules, i)));
-        ScopedUtfChars name(env, s.get());
-        if (name.c_str() == nullptr) return;
-        names.emplace_back(name.c_str());
-    }
-    dvbspy::omitModules(names);
+    if (elements(env, modules, names)) dvbspy::omitModules(names);
 }
 
 jlongArray Spy_liveDvbs(JNIEnv* env, jclass) {
@@ -223,19 +236,6 @@ jobjectArray Spy_takeLogs(JNIEnv* env, jclass) {
 
 jobjectArray Spy_takeGlobalRefEvents(JNIEnv* env, jclass) {
     return take(env, gRefEvents);
-}
-
-void Spy_trackGlobalRefs(JNIEnv* env, jclass) {
-    if (gOriginal == nullptr) {
-        ScopedLocalRef<jclass> cls(env, env->FindClass("java/lang/Class"));
-        gClassClass = static_cast<jclass>(env->NewGlobalRef(cls.get()));
-        gOriginal = env->functions;
-        gHooked = *env->functions;
-        gHooked.NewGlobalRef = hookedNewGlobalRef;
-        gHooked.DeleteGlobalRef = hookedDeleteGlobalRef;
-        dvbspy::setAttachHook(hookThread);
-    }
-    hookThread(env);
 }
 
 // What the loaded libDVBjni exports as `name`, or null. The library stays loaded for the
@@ -300,7 +300,6 @@ const JNINativeMethod gMethods[] = {
         MAKE_JNI_NATIVE_METHOD("takeLogs", "()[Ljava/lang/String;", Spy_takeLogs),
         MAKE_JNI_NATIVE_METHOD("takeGlobalRefEvents", "()[Ljava/lang/String;",
                                Spy_takeGlobalRefEvents),
-        MAKE_JNI_NATIVE_METHOD("trackGlobalRefs", "()V", Spy_trackGlobalRefs),
         MAKE_JNI_NATIVE_METHOD("entryPoints", "()[I", Spy_entryPoints),
         MAKE_JNI_NATIVE_METHOD("cacheEntry", "(Ljava/lang/String;II)[B", Spy_cacheEntry),
 };
@@ -323,6 +322,7 @@ jint JNI_OnLoad(JavaVM* vm, void*) {
         return JNI_VERSION_1_4;
     }
     if (env->RegisterNatives(spy.get(), gMethods, NELEM(gMethods)) != JNI_OK) return -1;
+    trackGlobalRefs(env);
     return JNI_VERSION_1_4;
 }
 

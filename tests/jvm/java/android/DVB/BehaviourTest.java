@@ -3,7 +3,6 @@ package android.DVB;
 import static org.junit.jupiter.api.Assertions.*;
 
 import java.io.File;
-import java.time.Duration;
 import java.util.*;
 import java.util.concurrent.atomic.AtomicInteger;
 import org.junit.jupiter.api.*;
@@ -13,7 +12,6 @@ import org.junit.jupiter.params.provider.*;
 /** The methods whose arguments are not records of one layout, and the rules of their own. */
 class BehaviourTest extends SpyTestBase {
     static final File EPG_DB = new File(System.getProperty("dvb.epgdb", "/nonexistent/epg.db"));
-    static final Duration NO_HANG = Duration.ofMinutes(2); // reached only by a broken wait
 
     @BeforeEach
     @AfterEach

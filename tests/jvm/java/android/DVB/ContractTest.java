@@ -1,5 +1,6 @@
 package android.DVB;
 
+import static android.DVB.ContractTest.Ret.*;
 import static android.DVB.Records.*;
 import static org.junit.jupiter.api.Assertions.*;
 
@@ -32,8 +33,9 @@ class ContractTest extends SpyTestBase {
         }
     }
 
-    static Rec in(Layout l, int record) {
-        return new Rec(l, true, -1, record, l.size);
+    /** Every in-record of a call is the first it hands over, several Java objects making one. */
+    static Rec in(Layout l) {
+        return new Rec(l, true, -1, 0, l.size);
     }
 
     static Rec out(Layout l, int arg, int record) {
@@ -44,8 +46,10 @@ class ContractTest extends SpyTestBase {
         return new Rec(l, false, arg, record, 4);
     }
 
-    static Row row(String method, String op, Ret ret, Object[] args, long... opArgs) {
-        return new Row(op.split(":")[0], method, op, ret, args, opArgs);
+    /** A row of `op` ("Cls::Name"), reached from the method Cls_Name, or Name if it has a prefix. */
+    static Row row(String op, Ret ret, Object[] args, long... opArgs) {
+        String[] p = op.split("::");
+        return new Row(p[0], p[1].contains("_") ? p[1] : p[0] + "_" + p[1], op, ret, args, opArgs);
     }
 
     static Object[] a(Object... args) {
@@ -57,76 +61,70 @@ class ContractTest extends SpyTestBase {
 
     static final Row[] ROWS = {
         // Tuning, positioner, output, device services: arguments at their widths.
-        row("Cfg_TryTune", "Cfg::TryTune", Ret.MODULE, a(-3, in(ANT_FRONTEND, 0)), -3, 0),
-        row("Cfg_Tune", "Cfg::Tune", Ret.MODULE, a(7, in(ANT_FRONTEND, 0)), 7, 0),
-        row("Cfg_GetStatus", "Cfg::GetStatus", Ret.ZERO, a(4, out(ANT_STATUS, 1, 0)), 4, 0),
-        row("Cfg_Reset", "Cfg::Reset", Ret.MODULE, a(-9), -9),
-        row("Cfg_GotoPosition", "Cfg::GotoPosition", Ret.MODULE, a(1, 300), 1, 44),
-        row("Cfg_GotoPosition", "Cfg::GotoPosition", Ret.MODULE, a(1, -1), 1, 255),
-        row("Cfg_StorePosition", "Cfg::StorePosition", Ret.MODULE, a(-2, 511), -2, 255),
-        row("Cfg_Recalculate", "Cfg::Recalculate", Ret.MODULE, a(3, 257), 3, 1),
-        row("Cfg_Drive", "Cfg::Drive", Ret.MODULE, a(4, 1, 255, 256), 4, 1, 255, 0),
-        row("Cfg_Stop", "Cfg::Stop", Ret.MODULE, a(Integer.MIN_VALUE), Integer.MIN_VALUE),
-        row("Cfg_SetLimit", "Cfg::SetLimit", Ret.MODULE, a(5, -256), 5, 0),
-        row("Cfg_DisableLimit", "Cfg::DisableLimit", Ret.MODULE, a(6), 6),
-        row("Cfg_EnableLimit", "Cfg::EnableLimit", Ret.MODULE, a(-6), -6),
-        row("Cfg_GotoSatellite", "Cfg::GotoSatellite", Ret.MODULE, a(7, 40000, -1, 32768),
-                7, -25536, -1, -32768),
-        row("Cfg_SetMuteAudio", "Cfg::SetMuteAudio", Ret.MODULE, a(8, 256), 8, 0),
-        row("Cfg_SetAudioVolume", "Cfg::SetAudioVolume", Ret.MODULE, a(-150), -150),
-        row("Cfg_SetMuteVideo", "Cfg::SetMuteVideo", Ret.MODULE, a(9, -255), 9, 1),
-        row("Cfg_SetVideoPos", "Cfg::SetVideoPos", Ret.MODULE, a(2, in(VIDEO_POSITION, 0)), 2, 0),
-        row("Cfg_GetVideoPos", "Cfg::GetVideoPos", Ret.ZERO, a(6, out(VIDEO_POSITION, 1, 0)),
-                6, 0),
-        row("Cfg_CaGetStatus", "Cfg::CaGetStatus", Ret.ZERO, a(-4, split(CA_STATUS, 1, 0)), -4, 0, 0),
-        row("Cfg_CaStandby", "Cfg::CaStandby", Ret.ZERO, a(-1), -1),
-        row("Cfg_GpioSet", "Cfg::GpioSet", Ret.ZERO, a(12, -13), 12, -13),
-        row("Cfg_SetWakeup", "Cfg::SetWakeup", Ret.ZERO, a(3600), 3600),
-        row("Cfg_BlindScanStart", "Cfg::BlindScanStart", Ret.ZERO, a(1, -2, 3, -4, 5),
-                1, -2, 3, -4, 5),
-        row("Cfg_BlindScanStop", "Cfg::BlindScanStop", Ret.ZERO, a(-8), -8),
-        row("Cfg_TSDumpStop", "Cfg::TSDumpStop", Ret.ZERO, a()),
+        row("Cfg::TryTune", MODULE, a(-3, in(ANT_FRONTEND)), -3, 0),
+        row("Cfg::Tune", MODULE, a(7, in(ANT_FRONTEND)), 7, 0),
+        row("Cfg::GetStatus", ZERO, a(4, out(ANT_STATUS, 1, 0)), 4, 0),
+        row("Cfg::Reset", MODULE, a(-9), -9),
+        row("Cfg::GotoPosition", MODULE, a(1, 300), 1, 44),
+        row("Cfg::GotoPosition", MODULE, a(1, -1), 1, 255),
+        row("Cfg::StorePosition", MODULE, a(-2, 511), -2, 255),
+        row("Cfg::Recalculate", MODULE, a(3, 257), 3, 1),
+        row("Cfg::Drive", MODULE, a(4, 1, 255, 256), 4, 1, 255, 0),
+        row("Cfg::Stop", MODULE, a(Integer.MIN_VALUE), Integer.MIN_VALUE),
+        row("Cfg::SetLimit", MODULE, a(5, -256), 5, 0),
+        row("Cfg::DisableLimit", MODULE, a(6), 6),
+        row("Cfg::EnableLimit", MODULE, a(-6), -6),
+        row("Cfg::GotoSatellite", MODULE, a(7, 40000, -1, 32768), 7, -25536, -1, -32768),
+        row("Cfg::SetMuteAudio", MODULE, a(8, 256), 8, 0),
+        row("Cfg::SetAudioVolume", MODULE, a(-150), -150),
+        row("Cfg::SetMuteVideo", MODULE, a(9, -255), 9, 1),
+        row("Cfg::SetVideoPos", MODULE, a(2, in(VIDEO_POSITION)), 2, 0),
+        row("Cfg::GetVideoPos", ZERO, a(6, out(VIDEO_POSITION, 1, 0)), 6, 0),
+        row("Cfg::CaGetStatus", ZERO, a(-4, split(CA_STATUS, 1, 0)), -4, 0, 0),
+        row("Cfg::CaStandby", ZERO, a(-1), -1),
+        row("Cfg::GpioSet", ZERO, a(12, -13), 12, -13),
+        row("Cfg::SetWakeup", ZERO, a(3600), 3600),
+        row("Cfg::BlindScanStart", ZERO, a(1, -2, 3, -4, 5), 1, -2, 3, -4, 5),
+        row("Cfg::BlindScanStop", ZERO, a(-8), -8),
+        row("Cfg::TSDumpStop", ZERO, a()),
         // Scanning and system start-up.
-        row("Scnm_Init", "Scnm::Init", Ret.MODULE, a()),
-        row("Scnm_Open", "Scnm::Open", Ret.MODULE, a(in(SCNM_OPEN, 0)), 0),
-        row("Scnm_Close", "Scnm::Close", Ret.MODULE, a(H), L),
-        row("Scnm_Start", "Scnm::Start", Ret.MODULE, a(H, in(SCNM_START, 0)), L, 0),
-        row("Scnm_Stop", "Scnm::Stop", Ret.MODULE, a(H), L),
-        row("Scnm_GetStatus", "Scnm::GetStatus", Ret.ZERO, a(H, out(SCNM_STATUS, 1, 0)), L, 0),
-        row("Dvb_SystemUnInit", "Scnm::Dvb_SystemUnInit", Ret.ZERO, a(in(DVB_CONFIG, 0)), 0),
+        row("Scnm::Init", MODULE, a()),
+        row("Scnm::Open", MODULE, a(in(SCNM_OPEN)), 0),
+        row("Scnm::Close", MODULE, a(H), L),
+        row("Scnm::Start", MODULE, a(H, in(SCNM_START)), L, 0),
+        row("Scnm::Stop", MODULE, a(H), L),
+        row("Scnm::GetStatus", ZERO, a(H, out(SCNM_STATUS, 1, 0)), L, 0),
+        row("Scnm::Dvb_SystemUnInit", ZERO, a(in(DVB_CONFIG)), 0),
         // Streams.
-        row("Strm_Init", "Strm::Init", Ret.MODULE, a()),
-        row("Strm_Open", "Strm::Open", Ret.MODULE, a(in(STRM_OPEN, 0)), 0),
-        row("Strm_Close", "Strm::Close", Ret.ZERO, a(H), L),
-        row("Strm_Start", "Strm::Start", Ret.MODULE,
-                a(H, in(STRM_SERVICE, 0), in(STRM_LANG, 0), in(STRM_FRONTEND, 0)), L, 0),
-        row("Strm_Stop", "Strm::Stop", Ret.MODULE, a(H, true), L, 1),
-        row("Strm_Stop", "Strm::Stop", Ret.MODULE, a(H, false), L, 0),
-        row("Strm_GetSettings", "Strm::GetSettings", Ret.ZERO, a(H, out(STRM_SERVICE, 1, 0),
+        row("Strm::Init", MODULE, a()),
+        row("Strm::Open", MODULE, a(in(STRM_OPEN)), 0),
+        row("Strm::Close", ZERO, a(H), L),
+        row("Strm::Start", MODULE, a(H, in(STRM_SERVICE), in(STRM_LANG), in(STRM_FRONTEND)), L, 0),
+        row("Strm::Stop", MODULE, a(H, true), L, 1),
+        row("Strm::Stop", MODULE, a(H, false), L, 0),
+        row("Strm::GetSettings", ZERO, a(H, out(STRM_SERVICE, 1, 0),
                 out(STRM_PVR, 1, 0), out(STRM_LANG, 1, 0), out(STRM_FRONTEND_SETTINGS, 1, 0)),
                 L, 0),
-        row("Strm_SetSettings", "Strm::SetSettings", Ret.ZERO, a(H, in(STRM_SERVICE, 0),
-                in(STRM_PVR, 0), in(STRM_LANG, 0), in(STRM_FRONTEND_SETTINGS, 0)), L, 0),
-        row("Strm_GetStatus", "Strm::GetStatus", Ret.ZERO, a(H, out(STRM_STATUS, 1, 0)), L, 0),
-        row("Strm_CreatStreamInfo", "Strm::CreatStreamInfo", Ret.ZERO,
-                a(H, out(STREAM_INFO, 1, 0)), L, 0),
-        row("Strm_GetAllEvent", "Strm::GetAllEvent", Ret.ZERO, a(H, out(EVENT, 1, 0),
+        row("Strm::SetSettings", ZERO, a(H, in(STRM_SERVICE),
+                in(STRM_PVR), in(STRM_LANG), in(STRM_FRONTEND_SETTINGS)), L, 0),
+        row("Strm::GetStatus", ZERO, a(H, out(STRM_STATUS, 1, 0)), L, 0),
+        row("Strm::CreatStreamInfo", ZERO, a(H, out(STREAM_INFO, 1, 0)), L, 0),
+        row("Strm::GetAllEvent", ZERO, a(H, out(EVENT, 1, 0),
                 out(EVENT, 2, 1), out(EXT_EVENT, 3, 2), out(EXT_EVENT, 4, 3)), L, 0, 0, 0, 0),
-        row("Strm_GetTime", "Strm::GetTime", Ret.WRITTEN, a(H, -1L), L, 0),
-        row("Strm_GetEvent", "Strm::GetEvent", Ret.ZERO, a(H, out(EVENT, 1, 0)), L, 0),
-        row("EPG_GetEvent", "Strm::EPG_GetEvent", Ret.ZERO,
-                a(H, in(EPG_SVC_IDS, 0), out(EVENT, 2, 1), out(EXT_EVENT, 3, 2)), 0, L, 0, 0),
-        row("EpgMd_AddService", "Strm::EpgMd_AddService", Ret.ZERO, a(in(EPG_SVC, 0)), 0),
-        row("EpgMd_ClearService", "Strm::EpgMd_ClearService", Ret.ZERO, a()),
-        row("Strm_CheckService", "Strm::CheckService", Ret.ZERO, a(in(SERVICE_CHECK, 0)), 0),
+        row("Strm::GetTime", WRITTEN, a(H, -1L), L, 0),
+        row("Strm::GetEvent", ZERO, a(H, out(EVENT, 1, 0)), L, 0),
+        row("Strm::EPG_GetEvent", ZERO,
+                a(H, in(EPG_SVC_IDS), out(EVENT, 2, 1), out(EXT_EVENT, 3, 2)), 0, L, 0, 0),
+        row("Strm::EpgMd_AddService", ZERO, a(in(EPG_SVC)), 0),
+        row("Strm::EpgMd_ClearService", ZERO, a()),
+        row("Strm::CheckService", ZERO, a(in(SERVICE_CHECK)), 0),
         // Subtitles and teletext.
-        row("Subttl_Init", "Subttl::Init", Ret.MODULE, a()),
-        row("Subttl_Start", "Subttl::Start", Ret.MODULE, a(in(SUBTTL_SETTINGS, 0)), 0),
-        row("Subttl_Stop", "Subttl::Stop", Ret.ZERO, a(H), L),
-        row("Teltxt_Start", "Teltxt::Start", Ret.MODULE, a(in(TELTXT_SETTINGS, 0)), 0),
-        row("Teltxt_Stop", "Teltxt::Stop", Ret.ZERO, a(H), L),
-        row("Teltxt_SetData", "Teltxt::SetData", Ret.MODULE, a(H, -3, 0x10000, split(NAV_PAGES, 3, 0)),
-                L, -3, 0x10000, 0, 0, 0, 0),
+        row("Subttl::Init", MODULE, a()),
+        row("Subttl::Start", MODULE, a(in(SUBTTL_SETTINGS)), 0),
+        row("Subttl::Stop", ZERO, a(H), L),
+        row("Teltxt::Start", MODULE, a(in(TELTXT_SETTINGS)), 0),
+        row("Teltxt::Stop", ZERO, a(H), L),
+        row("Teltxt::SetData", MODULE, a(H, -3, 0x10000, split(NAV_PAGES, 3, 0)), L, -3, 0x10000, 0, 0, 0, 0),
     };
 
     static Stream<Arguments> cases() {
@@ -178,7 +176,7 @@ class ContractTest extends SpyTestBase {
                 }
             }
         }
-        if (r.ret == Ret.WRITTEN) {
+        if (r.ret == WRITTEN) {
             scripted[0] = le32(result);
             Spy.setOut(r.op, r.opArgs.length - 1, 0, scripted[0]);
         }
@@ -196,7 +194,7 @@ class ContractTest extends SpyTestBase {
                 rec.layout.assertJava(whole[rec.arg], javaArgs[i], kept[i]);
             }
         }
-        long want = r.ret == Ret.ZERO ? 0 : r.ret == Ret.WRITTEN ? result & 0xFFFFFFFFL : result;
+        long want = r.ret == ZERO ? 0 : r.ret == WRITTEN ? result & 0xFFFFFFFFL : result;
         assertEquals(want, ((Number) got).longValue(), "result");
         assertEquals(entryLines(r.cls, r.method), logs());
     }

@@ -30,7 +30,20 @@ class DvbTest extends SpyTestBase {
         return live[0];
     }
 
-    /** Global references made, and made minus deleted, since the last look. */
+    /** Nothing bound, not even by earlier tests, and no global reference events so far. */
+    void startUnbound() {
+        dvb.release();
+        dvb = null;
+        for (int i = 0; i < 3 && Spy.liveDvbs().length > 0; i++) {
+            System.gc();
+            System.runFinalization();
+        }
+        assertEquals(0, Spy.liveDvbs().length + Spy.liveListenerCount(), "earlier tests' objects");
+        Spy.takeGlobalRefEvents();
+        Spy.takeLogs();
+    }
+
+    /** Global references made on the test and service threads, and made minus deleted. */
     static List<Integer> refs() {
         int made = 0;
         int balance = 0;
@@ -51,9 +64,7 @@ class DvbTest extends SpyTestBase {
 
     @Test
     void bindingLifeCycleWithItsLinesAndReferences() throws Throwable {
-        dvb.release();
-        Spy.trackGlobalRefs();
-        Spy.takeGlobalRefEvents();
+        startUnbound();
         dvb = new DVB();
         assertEquals(List.of("new class", "new object"), List.of(Spy.takeGlobalRefEvents()));
         long first = onlyDvb();
@@ -65,7 +76,7 @@ class DvbTest extends SpyTestBase {
         assertNotEquals(first, second);
         assertNotEquals(firstContext, dvb.nativeContext());
         assertEquals(lines(second, "native_setup"), List.of(Spy.takeLogs()));
-        Spy.takeGlobalRefEvents();
+        assertEquals(List.of(2, 0), refs(), "the first binding's references went with it");
         dvb.release();
         assertEquals(List.of("delete object", "delete class"), List.of(Spy.takeGlobalRefEvents()));
         assertEquals(0, dvb.nativeContext());
@@ -121,15 +132,7 @@ class DvbTest extends SpyTestBase {
     @SuppressWarnings({"deprecation", "removal"})
     void theContextTableHoldsExactly4096BoundObjects() {
         assumeTrue(WIDE, "a 32-bit context is the address itself");
-        dvb.release();
-        dvb = null;
-        for (int i = 0; i < 3 && Spy.liveDvbs().length > 0; i++) {
-            System.gc();
-            System.runFinalization();
-        }
-        assertEquals(0, Spy.liveDvbs().length, "objects of earlier tests still bound");
-        Spy.trackGlobalRefs();
-        Spy.takeGlobalRefEvents();
+        startUnbound();
         List<DVB> bound = new ArrayList<>();
         try {
             RuntimeException e = assertThrows(RuntimeException.class, () -> {
@@ -156,9 +159,7 @@ class DvbTest extends SpyTestBase {
      */
     @Test
     void concurrentCallsEventsAndBindings() throws Exception {
-        dvb.release();
-        Spy.trackGlobalRefs();
-        Spy.takeGlobalRefEvents();
+        startUnbound();
         dvb = new DVB();
         AtomicLong received = new AtomicLong();
         dvb.setOnEventListener((d, msg, e1, e2, obj) -> received.addAndGet(msg == 42 ? 1 : 0));
@@ -174,18 +175,15 @@ class DvbTest extends SpyTestBase {
                 }
             }));
         }
-        threads.add(new Thread(() -> {
-            Spy.trackGlobalRefs();
-            for (int i = 0; i < 300; i++) {
-                DVB other = new DVB();
-                other.setOnEventListener((d, msg, e1, e2, obj) -> { });
-                other.getCfg().Cfg_Stop(i);
-                other.release();
-            }
-        }));
         threads.add(new Thread(() -> Spy.raise(42, 0, 0, 500, 4)));
         threads.forEach(t -> t.setUncaughtExceptionHandler((th, e) -> failures.add(e)));
         threads.forEach(Thread::start);
+        for (int i = 0; i < 300; i++) { // on the test thread, whose global references are watched
+            DVB other = new DVB();
+            other.setOnEventListener((d, msg, e1, e2, obj) -> { });
+            other.getCfg().Cfg_Stop(i);
+            other.release();
+        }
         for (Thread t : threads) t.join();
         assertEquals(List.of(), failures);
         assertEquals(2000, received.get(), "events to the bound object");

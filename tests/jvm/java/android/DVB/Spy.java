@@ -25,7 +25,6 @@ final class Spy {
     static native void raise(int msg, int ext1, int ext2, int count, int threads);
     static native String[] takeLogs();
     static native String[] takeGlobalRefEvents();
-    static native void trackGlobalRefs();
     static native int[] entryPoints();
     static native byte[] cacheEntry(String symbol, int index, int size);
 }

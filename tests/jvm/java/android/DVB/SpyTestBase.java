@@ -5,6 +5,7 @@ import static org.junit.jupiter.api.Assertions.*;
 import java.lang.reflect.*;
 import java.nio.ByteBuffer;
 import java.nio.ByteOrder;
+import java.time.Duration;
 import java.util.*;
 import org.junit.jupiter.api.AfterEach;
 import org.junit.jupiter.api.BeforeEach;
@@ -17,6 +18,7 @@ abstract class SpyTestBase {
     static final String GETTER = "2 SCNM getScnm was called";
     static final String NET_BEGIN = "2 SCNM +++android_dvb_Scnm_GetServiceList";
     static final boolean WIDE = System.getProperty("sun.arch.data.model").equals("64");
+    static final Duration NO_HANG = Duration.ofMinutes(2); // reached only by a broken wait
 
     static {
         Spy.reset(); // loads the test library first
