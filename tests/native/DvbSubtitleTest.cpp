@@ -228,6 +228,11 @@ TEST(DvbSubtitle, DamagedSegmentsAreDroppedAndCounted) {
         }
         return size_t{0};
     };
+    // The flags of the CLUT segment's last entry: its range bit flipped, the entry runs past
+    // the segment's end (a full-range entry takes 6 bytes, a reduced one 4).
+    const size_t clut = bodyOf(0x12, 0), clutEnd = clut + (good[clut - 2] << 8 | good[clut - 1]);
+    size_t lastFlags = clut + 3;
+    for (size_t i = clut + 2; i + 1 < clutEnd; i += (good[i + 1] & 1) ? 6 : 4) lastFlags = i + 1;
     // What: the byte at `at` set to `value`, `keep` bytes kept; the count that tells; whether
     // the 4-bit region's pixels survive.
     const struct {
@@ -242,6 +247,8 @@ TEST(DvbSubtitle, DamagedSegmentsAreDroppedAndCounted) {
              &DvbSubtitleStats::objectsDropped, false},
             {"object of a reserved coding method", bodyOf(0x13, 1) + 2, 0x0C, good.size(),
              &DvbSubtitleStats::objectsDropped, false},
+            {"CLUT entry running past its segment", lastFlags, good[lastFlags] ^ 1u, good.size(),
+             &DvbSubtitleStats::segmentsDropped, true},
             {"object placed past the region's edge", bodyOf(0x11, 1) + 12, 0x02, good.size(),
              &DvbSubtitleStats::runsClipped, false},
             {"last object without sync, cut short", bodyOf(0x13, 2) - 6, 0x0E, bodyOf(0x13, 2) + 40,
