@@ -28,6 +28,12 @@ inline void removeDatabase(const std::string& path) {
     for (const char* suffix : {"", "-wal", "-shm"}) std::filesystem::remove(path + suffix);
 }
 
+// A run that is too long to repeat within one measurement: one iteration, in milliseconds,
+// repeated `repetitions` times for the median.
+inline benchmark::internal::Benchmark* once(benchmark::internal::Benchmark* b, int repetitions) {
+    return b->Unit(benchmark::kMillisecond)->Iterations(1)->Repetitions(repetitions);
+}
+
 // Keeps the median times of each benchmark besides printing the usual table.
 class Medians : public benchmark::ConsoleReporter {
 public:
