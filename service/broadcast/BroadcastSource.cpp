@@ -82,9 +82,9 @@ void merge(Broadcast& b, std::vector<std::vector<bool>>& tuned,
         auto net = std::find_if(b.networks.begin(), b.networks.end(),
                                 [&](const Network& n) { return n.id == from.id; });
         if (net == b.networks.end()) {
-            Network n = from;
-            n.transports.clear();
-            net = b.networks.insert(b.networks.end(), n);
+            // The network without its transports, which are merged one by one below.
+            net = b.networks.insert(b.networks.end(),
+                                    Network{from.id, from.name, from.delivery, {}});
             tuned.emplace_back(), actual.emplace_back();
         } else if (net->name.empty()) {
             net->name = from.name;

@@ -49,10 +49,7 @@ extern "C" {
 #include <dvbpsi/tot.h>
 }
 
-#if __has_include("broadcast/DvbTeletext.h")
 #include "broadcast/DvbTeletext.h"
-#define DVB_HAS_TELETEXT 1
-#endif
 
 namespace dvbmodel {
 
@@ -726,15 +723,15 @@ void Reader::timing(const uint8_t* p, uint16_t pid, bool payload, bool start, si
     if (pid == ptsPid_) minPts_ = std::min(minPts_, pts), maxPts_ = std::max(maxPts_, pts);
 }
 
+// A packet that unread() did not skip.
 void Reader::packet(const uint8_t* p) {
-    ++stats_.packets;
     const uint16_t pid = (p[1] & 0x1F) << 8 | p[2];
     if (p[1] & 0x80) {
         ++stats_.transportErrors;
         continuity_[pid] = -1;
         return;
     }
-    if (pid == 0x1FFF || unread(p)) return;
+    if (pid == 0x1FFF) return;
     const bool payload = p[3] & 0x10, adaptation = p[3] & 0x20;
     const bool discontinuity = adaptation && p[4] > 0 && (p[5] & 0x80);
     const int cc = p[3] & 0x0F;
@@ -785,9 +782,9 @@ void Reader::eitSection(const uint8_t* s, size_t n) {
                          uint64_t(s[8] << 8 | s[9]) << 24 | uint64_t(s[10] << 8 | s[11]) << 8 |
                          s[6];
     const uint8_t version = s[5] >> 1 & 0x1F;
-    auto seen = eitVersions_.find(key);
-    if (seen != eitVersions_.end() && seen->second == version) return;
-    eitVersions_[key] = version;
+    auto [seen, fresh] = eitVersions_.try_emplace(key, version);
+    if (!fresh && seen->second == version) return;
+    seen->second = version;
     eitNumber_ = s[6];
     eitVersion_ = version;
     uint8_t one[4096];  // a section is at most 4096 bytes, its length field at most 4095 + 3
@@ -891,9 +888,7 @@ void Reader::timedContent(const uint8_t* d, size_t begin, size_t size) {
         Service* service;
         PesAssembler assembler;
         std::unique_ptr<DvbSubtitleDecoder> subtitles;
-#ifdef DVB_HAS_TELETEXT
         std::unique_ptr<TeletextDecoder> teletext;
-#endif
         bool inPes = false;
     };
     std::vector<Stream> streams;
@@ -906,12 +901,10 @@ void Reader::timedContent(const uint8_t* d, size_t begin, size_t size) {
                 st.subtitles = std::make_unique<DvbSubtitleDecoder>(c.compositionPageId,
                                                                     c.ancillaryPageId);
             }
-#ifdef DVB_HAS_TELETEXT
             // The teletext PES of a service go to the teletext decoder here, and only here.
             if (c.kind == Kind::Teletext) {
                 streams.emplace_back(c.pid, &s).teletext = std::make_unique<TeletextDecoder>();
             }
-#endif
         }
     }
     if (streams.empty() && videos.empty()) return;
@@ -928,10 +921,7 @@ void Reader::timedContent(const uint8_t* d, size_t begin, size_t size) {
                     set.time = msOf(set.pts);
                 }
             }
-#ifdef DVB_HAS_TELETEXT
             if (st.teletext) st.teletext->feed(one.data(), one.size(), ms, st.service->teletext);
-#endif
-            (void)ms;
         }
         pes.clear();
     };
@@ -983,7 +973,6 @@ void Reader::timedContent(const uint8_t* d, size_t begin, size_t size) {
             t.stringsDropped += s.stringsDropped, t.missingCluts += s.missingCluts;
             t.displaySets += s.displaySets;
         }
-#ifdef DVB_HAS_TELETEXT
         if (st.teletext) {
             st.teletext->flush(st.service->teletext);
             const TeletextStats& s = st.teletext->stats();
@@ -992,7 +981,6 @@ void Reader::timedContent(const uint8_t* d, size_t begin, size_t size) {
             stats_.teletextPacketsDropped += s.packetsDropped;
             stats_.teletextPages += s.pages;
         }
-#endif
     }
     for (auto& [program, s] : pmtServices_) {
         std::stable_sort(s.subtitles.begin(), s.subtitles.end(),
@@ -1150,7 +1138,7 @@ bool Reader::read(const uint8_t* d, size_t size, const std::string& name, TsCapt
         pat_ = nullptr;
     }
     nit_ = demux(), sdt_ = demux(), eit_ = demux(), tdt_ = demux();
-    uint64_t skipped = 0;
+    uint64_t packets = 0;
     constexpr size_t kAhead = 15 * kPacket;
     for (size_t pos = begin; pos + kPacket <= size;) {
         const uint8_t* p = d + pos;
@@ -1160,15 +1148,12 @@ bool Reader::read(const uint8_t* d, size_t size, const std::string& name, TsCapt
             continue;
         }
         pos += kPacket;
+        ++packets;
         // The walk waits on memory, not on its few tests: ask for the packets ahead early.
         if (pos + kAhead < size) __builtin_prefetch(d + pos + kAhead);
-        if (unread(p)) {
-            ++skipped;
-            continue;
-        }
-        packet(p);
+        if (!unread(p)) packet(p);
     }
-    stats_.packets += skipped;
+    stats_.packets += packets;
     timedContent(d, begin, size);
     build(out);
     tReader = nullptr;

@@ -21,12 +21,7 @@
 
 #include "broadcast/DvbSubtitle.h"
 
-// Teletext joins here: the teletext encoder (DvbTeletext.h, encodeTeletextPes) is built beside
-// this writer; once it is part of the build, each service's pages go out in teletext() below.
-#if __has_include("broadcast/DvbTeletext.h")
 #include "broadcast/DvbTeletext.h"
-#define DVB_TS_TELETEXT 1
-#endif
 
 namespace dvbmodel {
 namespace {
@@ -1036,10 +1031,12 @@ void TsWriter::packetize(uint16_t pid, const uint8_t* head, size_t headLen, size
 
 void TsWriter::subtitle(const Service& s, uint32_t index, int64_t at) {
     const DisplaySet& set = s.subtitles[index];
+    std::vector<uint8_t> pes;  // the same PES for every component of the page: made once
+    bool made = false;
     for (const auto& c : s.components) {
         if (c.kind != Kind::Subtitle || c.compositionPageId != set.pageId) continue;
-        std::vector<uint8_t> pes =
-                encodeDisplaySet(set, set.pageId, tsClockAt(at + kTsDecodeDelayMs));
+        if (!made) pes = encodeDisplaySet(set, set.pageId, tsClockAt(at + kTsDecodeDelayMs));
+        made = true;
         if (pes.empty()) {
             ++st_.stats_.displaySetsDropped;
             continue;
@@ -1049,22 +1046,20 @@ void TsWriter::subtitle(const Service& s, uint32_t index, int64_t at) {
 }
 
 void TsWriter::teletext(const Service& s, uint32_t index, int64_t at) {
-#ifdef DVB_TS_TELETEXT
     // The pages sent at this moment: from `index` while their time is the same.
     size_t count = 1;
     while (index + count < s.teletext.size() &&
            s.teletext[index + count].time == s.teletext[index].time)
         ++count;
+    std::vector<uint8_t> pes;  // the same PES for every teletext component: made once
+    bool made = false;
     for (const auto& c : s.components) {
         if (c.kind != Kind::Teletext) continue;
-        std::vector<uint8_t> pes =
-                encodeTeletextPes(&s.teletext[index], count, tsClockAt(at + kTsDecodeDelayMs));
+        if (!made)
+            pes = encodeTeletextPes(&s.teletext[index], count, tsClockAt(at + kTsDecodeDelayMs));
+        made = true;
         if (!pes.empty()) packetize(c.pid, pes.data(), pes.size(), pes.size());
     }
-#else
-    // Teletext pages travel once the teletext encoder is part of the build.
-    (void)s, (void)index, (void)at;
-#endif
 }
 
 void writeTransport(const Broadcast& broadcast, const Network& network, const Transport& transport,

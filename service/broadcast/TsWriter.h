@@ -45,8 +45,8 @@ struct TsWriterOptions {
     // A recording of one service of the transport: its PIDs only, with a PAT, an SDT actual
     // of that one program and its PMT; no other table. Null: the whole transport.
     const Service* only = nullptr;
-    // Bits per second of each video component's PES payload.
-    // Video bits per second; at 2 Mbit/s an SD MPEG video frame carries the test card below.
+    // Bits per second of each video component's PES payload; at 2 Mbit/s an SD MPEG video
+    // frame carries the writer's test card.
     uint32_t videoBitRate = 2000000;
 };
 
