@@ -257,6 +257,22 @@ struct Network {
     std::vector<Transport> transports;
 };
 
+// The event of `service` running at UTC `seconds` (the first listed that covers it), and the
+// one that starts next after `seconds`; null where there is none.
+inline const Event* eventAt(const Service& service, int64_t seconds) {
+    for (const auto& e : service.events) {
+        if (e.start <= seconds && seconds < e.start + static_cast<int64_t>(e.duration)) return &e;
+    }
+    return nullptr;
+}
+inline const Event* eventAfter(const Service& service, int64_t seconds) {
+    const Event* next = nullptr;
+    for (const auto& e : service.events) {
+        if (e.start > seconds && (next == nullptr || e.start < next->start)) next = &e;
+    }
+    return next;
+}
+
 struct Broadcast {
     std::vector<Network> networks;
     int64_t start = 0;  // UTC at the start of the broadcast's loop

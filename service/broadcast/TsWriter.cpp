@@ -152,21 +152,6 @@ uint8_t* packetHeader(std::vector<uint8_t>& out, uint16_t pid, bool start, uint8
     return p + 4;
 }
 
-const Event* eventAt(const Service& svc, int64_t seconds) {
-    const Event* found = nullptr;
-    for (const auto& e : svc.events) {
-        if (e.start <= seconds && seconds < e.start + static_cast<int64_t>(e.duration)) found = &e;
-    }
-    return found;
-}
-
-const Event* eventAfter(const Service& svc, int64_t seconds) {
-    for (const auto& e : svc.events) {
-        if (e.start > seconds) return &e;
-    }
-    return nullptr;
-}
-
 // MSB-first bits into a byte vector, for the picture below.
 class BitWriter {
 public:

@@ -275,7 +275,7 @@ std::vector<std::array<int, 3>> Receiver::collectEvents(int64_t now) {
     }
     for (auto& [handle, stream] : streams) {
         if (!stream.started || stream.service == nullptr) continue;
-        const dvbmodel::Event* ev = eventAt(*stream.service, now / 1000);
+        const dvbmodel::Event* ev = dvbmodel::eventAt(*stream.service, now / 1000);
         int32_t id = ev != nullptr ? ev->id : -1;
         if (id != stream.reportedEvent) {
             stream.reportedEvent = id;
@@ -502,21 +502,6 @@ Signal Receiver::signal(const ANT_FrontendParameters& p, int64_t tunedAt, int64_
         s.ber = (100 - s.quality) * (100 - s.quality) / 10;
     }
     return s;
-}
-
-const dvbmodel::Event* Receiver::eventAt(const dvbmodel::Service& service, int64_t seconds) {
-    for (const auto& e : service.events) {
-        if (e.start <= seconds && seconds < e.start + static_cast<int64_t>(e.duration)) return &e;
-    }
-    return nullptr;
-}
-
-const dvbmodel::Event* Receiver::eventAfter(const dvbmodel::Service& service, int64_t seconds) {
-    const dvbmodel::Event* next = nullptr;
-    for (const auto& e : service.events) {
-        if (e.start > seconds && (next == nullptr || e.start < next->start)) next = &e;
-    }
-    return next;
 }
 
 std::string epgDatabasePath() {

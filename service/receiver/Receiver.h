@@ -306,10 +306,6 @@ public:
     // Called under mLock.
     void requestEpgSync();
 
-    // Present and following events of `service` at `now` (null where there is none).
-    static const dvbmodel::Event* eventAt(const dvbmodel::Service& service, int64_t seconds);
-    static const dvbmodel::Event* eventAfter(const dvbmodel::Service& service, int64_t seconds);
-
 private:
     void run();
     std::vector<std::array<int, 3>> collectEvents(int64_t now);

@@ -134,7 +134,7 @@ void fillService(SCNM_ServiceInfo& node, const dvbmodel::Transport& tp,
     node.tsId = tp.tsid;
     node.onId = tp.onid;
     node.lcn = svc.lcn;
-    const dvbmodel::Event* now = Receiver::eventAt(svc, seconds);
+    const dvbmodel::Event* now = dvbmodel::eventAt(svc, seconds);
     node.content = now != nullptr ? now->content : 0;
 }
 

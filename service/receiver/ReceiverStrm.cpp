@@ -298,7 +298,7 @@ int32_t ReceiverStrm::GetStatus(int32_t handle, STRM_GetStatus* status) {
         // What the file holds so far: the service thread writes it as the clock moves.
         status->recduration = static_cast<int32_t>(s.recording ? s.recording->millis() / 1000 : 0);
         status->recsize = s.recording ? s.recording->bytes() : 0;
-        const dvbmodel::Event* recEvent = Receiver::eventAt(svc, s.shiftSince / 1000);
+        const dvbmodel::Event* recEvent = dvbmodel::eventAt(svc, s.shiftSince / 1000);
         status->recevent = recEvent != nullptr ? recEvent->id : 0;
         status->recstartTime = static_cast<int32_t>(s.shiftSince / 1000);
         status->reccurTime = static_cast<int32_t>(now / 1000);
@@ -306,7 +306,7 @@ int32_t ReceiverStrm::GetStatus(int32_t handle, STRM_GetStatus* status) {
         int64_t pos = std::clamp(s.shiftPos + (now - s.shiftAt) * num / div, int64_t{0}, recorded);
         status->pbstate = num == 0 ? kPvrPaused : num == div ? kPvrActive : kPvrTrick;
         status->pbposition = static_cast<int32_t>(pos / 1000);
-        const dvbmodel::Event* pbEvent = Receiver::eventAt(svc, (s.shiftSince + pos) / 1000);
+        const dvbmodel::Event* pbEvent = dvbmodel::eventAt(svc, (s.shiftSince + pos) / 1000);
         status->pbevent = pbEvent != nullptr ? pbEvent->id : 0;
         status->pbstartTime = status->recstartTime;
         status->pbendTime = status->reccurTime;
@@ -386,8 +386,8 @@ int32_t ReceiverStrm::GetAllEvent(int32_t handle, EpgEvent* present, EpgEvent* f
     int64_t seconds = mRx->clock().nowSeconds();
     const dvbmodel::Service& svc = *it->second.service;
     // EN 300 468 running status: 4 running, 1 not running.
-    if (const auto* ev = Receiver::eventAt(svc, seconds)) fillEvent(*ev, 4, present, presentExt);
-    if (const auto* ev = Receiver::eventAfter(svc, seconds))
+    if (const auto* ev = dvbmodel::eventAt(svc, seconds)) fillEvent(*ev, 4, present, presentExt);
+    if (const auto* ev = dvbmodel::eventAfter(svc, seconds))
         fillEvent(*ev, 1, following, followingExt);
     return kOk;
 }
@@ -398,7 +398,7 @@ int32_t ReceiverStrm::GetEvent(int32_t handle, EpgEvent* event) {
     auto it = mRx->streams.find(handle);
     if (it == mRx->streams.end()) return kErrBadHandle;
     if (!it->second.started) return kErrNotStarted;
-    const auto* ev = Receiver::eventAt(*it->second.service, mRx->clock().nowSeconds());
+    const auto* ev = dvbmodel::eventAt(*it->second.service, mRx->clock().nowSeconds());
     if (ev == nullptr) return kErrNoData;
     fillEvent(*ev, 4, event, nullptr);
     return kOk;

@@ -218,7 +218,7 @@ TEST(TsWriter, PresentFollowingTablesCarryRunningStatusAndANewVersionInLibdvbpsi
     Broadcast b = builtinBroadcast(kStart / 1000);
     const Transport& tp = b.networks[0].transports[0];
     // The first service's present event ends 5 s into the span: its p/f then takes version 1.
-    const Event* ending = dvbrx::Receiver::eventAt(tp.services[0], kStart / 1000 + 7 * 3600);
+    const Event* ending = eventAt(tp.services[0], kStart / 1000 + 7 * 3600);
     std::vector<uint8_t> ts;
     TsWriterState state;
     writeTransport(b, b.networks[0], tp, (ending->start + ending->duration) * 1000 - 5000, 10000,
