@@ -1211,11 +1211,19 @@ bool readTransportStreamFile(const std::string& path, TsCapture& out, std::strin
 }
 
 uint32_t sectionCrc32(const uint8_t* p, size_t n) {
+    // A byte at a time: every section the reader assembles and the writer completes goes
+    // through here.
+    static constexpr auto kTable = [] {
+        std::array<uint32_t, 256> t{};
+        for (uint32_t b = 0; b < 256; ++b) {
+            uint32_t crc = b << 24;
+            for (int k = 0; k < 8; ++k) crc = crc & 0x80000000 ? crc << 1 ^ 0x04C11DB7 : crc << 1;
+            t[b] = crc;
+        }
+        return t;
+    }();
     uint32_t crc = 0xFFFFFFFF;
-    for (size_t i = 0; i < n; ++i) {
-        crc ^= uint32_t(p[i]) << 24;
-        for (int k = 0; k < 8; ++k) crc = crc & 0x80000000 ? crc << 1 ^ 0x04C11DB7 : crc << 1;
-    }
+    for (size_t i = 0; i < n; ++i) crc = crc << 8 ^ kTable[(crc >> 24 ^ p[i]) & 0xFF];
     return crc;
 }
 
