@@ -185,18 +185,20 @@ void decodeIconv(std::string& out, std::string_view s, const char* name) {
 
 // Bytes in front of the text: none for table 00, the selector, its two bytes after 0x10, the
 // encoding id after 0x1F.
-size_t selectorLength(uint8_t first) {
+}  // namespace
+
+size_t selectorLength(std::string_view bytes) {
+    if (bytes.empty()) return 0;
+    const uint8_t first = bytes[0];
     return first >= 0x20 ? 0 : first == 0x10 ? 3 : first == 0x1F ? 2 : 1;
 }
-
-}  // namespace
 
 std::string decodeText(std::string_view bytes) {
     std::string out;
     if (bytes.empty()) return out;
     const Tables& t = tables();
     uint8_t first = bytes[0];
-    size_t skip = selectorLength(first);
+    size_t skip = selectorLength(bytes);
     if (bytes.size() < skip) return out;
     std::string_view s = bytes.substr(skip);
     out.reserve(s.size() + s.size() / 4);
@@ -287,7 +289,7 @@ size_t fitUtf8(std::string_view utf8, size_t limit) {
 size_t fitText(std::string_view bytes, size_t limit) {
     if (bytes.size() <= limit) return bytes.size();
     uint8_t first = bytes[0];
-    size_t start = selectorLength(first), n = limit;
+    size_t start = selectorLength(bytes), n = limit;
     if (limit <= start) return 0;
     if (first >= 0x20) {
         if (isDiacritic(bytes[n - 1])) --n;

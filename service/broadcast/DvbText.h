@@ -54,6 +54,10 @@ std::string decodeText(std::string_view bytes);
 // well-formed UTF-8 each become '?'. Empty text gives no bytes at all (not even a selector).
 std::string encodeText(std::string_view utf8, TextTable table);
 
+// Length of the character-table selector that starts broadcast text: 0 for table 00 (and
+// for no text), 3 for 0x10 0x00 NN, 2 for 0x1F NN, 1 for the other tables.
+size_t selectorLength(std::string_view bytes);
+
 // Length of the longest prefix of broadcast text, at most `limit` bytes, that ends on a whole
 // character of its table (a diacritic stays with its letter, a UCS-2 pair or multi-byte
 // character stays whole). 0 when not even the selector and one character fit.

@@ -50,6 +50,7 @@ extern "C" {
 }
 
 #include "broadcast/DvbTeletext.h"
+#include "broadcast/DvbText.h"
 
 namespace dvbmodel {
 
@@ -102,19 +103,14 @@ int64_t bcdSeconds(uint32_t d) {
     return h * 3600 + m * 60 + s;
 }
 
-// Length of the character-table selector that starts broadcast text (EN 300 468 annex A).
-size_t selectorLength(const std::string& s) {
-    if (s.empty() || uint8_t(s[0]) >= 0x20) return 0;
-    return s[0] == 0x10 ? 3 : s[0] == 0x1F ? 2 : 1;
-}
-
 // Appends a chunk of text that continues `to`; a chunk repeating the selector `to` starts with
 // gives its characters only, so the joined text keeps one selector.
 void appendText(std::string& to, const uint8_t* p, size_t n) {
-    std::string chunk(reinterpret_cast<const char*>(p), n);
+    const std::string_view chunk(reinterpret_cast<const char*>(p), n);
     const size_t sel = selectorLength(to);
-    if (!to.empty() && sel != 0 && chunk.compare(0, sel, to, 0, sel) == 0) chunk.erase(0, sel);
-    to += chunk;
+    to.append(sel != 0 && chunk.substr(0, sel) == std::string_view(to).substr(0, sel)
+                      ? chunk.substr(sel)
+                      : chunk);
 }
 
 std::string bytes(const uint8_t* p, size_t n) {
