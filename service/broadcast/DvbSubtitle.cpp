@@ -862,7 +862,7 @@ void PesAssembler::feed(const uint8_t* ts, size_t size, std::vector<std::vector<
         if (cc == continuity_) continue;  // a repeated packet
         bool lost = continuity_ >= 0 && cc != ((continuity_ + 1) & 15);
         continuity_ = cc;
-        size_t start = (afc & 2) ? 5 + size_t{p[4]} : 4;
+        size_t start = tsPayloadOffset(p);
         if (start > 188) continue;
         if (p[1] & 0x40) {
             complete(out);

@@ -106,6 +106,12 @@ std::vector<uint8_t> encodeDisplaySet(const DisplaySet& set, uint16_t pageId, ui
 uint64_t readPts(const uint8_t* five);
 void writePts(uint8_t* five, uint64_t pts);
 
+// Where a 188-byte transport packet's payload starts: after its header and, where it has one,
+// its adaptation field (a value over 188 says the field's length byte is broken).
+inline size_t tsPayloadOffset(const uint8_t* packet) {
+    return (packet[3] & 0x20) ? 5 + size_t{packet[4]} : 4;
+}
+
 // The PES packets of one PID, reassembled from 188-byte transport packets. A packet lost on
 // the way (continuity counter) or a transport error drops the PES being assembled.
 class PesAssembler {

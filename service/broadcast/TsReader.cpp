@@ -741,7 +741,7 @@ void Reader::packet(const uint8_t* p) {
         }
         continuity_[pid] = int8_t(cc + 1);
     }
-    const size_t offset = adaptation ? 5 + size_t{p[4]} : 4;
+    const size_t offset = tsPayloadOffset(p);
     if (offset > kPacket) return;
     timing(p, pid, payload, p[1] & 0x40, offset);
 
@@ -829,7 +829,7 @@ struct VideoProbe {
     uint32_t sequence = 0;  // the frame rate of a sequence header
 
     void start(const uint8_t* p) {
-        const size_t offset = (p[3] & 0x20) ? 5 + size_t{p[4]} : 4;
+        const size_t offset = tsPayloadOffset(p);
         if (offset + 19 > kPacket) return;
         const uint8_t* pes = p + offset;
         if (pes[0] != 0 || pes[1] != 0 || pes[2] != 1 || (pes[3] & 0xF0) != 0xE0 ||
