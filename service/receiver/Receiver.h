@@ -132,6 +132,7 @@ struct Stream {
     // Time shift: engaged by the settings' play speed; recorded from `shiftSince`, played from
     // `shiftPos` (ms into the recording) at `shiftAt` on, at playSpeed / playSpeedDiv.
     bool shifting = false;
+    bool shiftOpening = false;  // time shift is making its file, outside the lock
     int64_t shiftSince = 0, shiftPos = 0, shiftAt = 0;
     // The recording that time shift makes, from shiftSince on (null when live).
     std::shared_ptr<Recording> recording;
@@ -169,6 +170,7 @@ struct Outputs {
     bool blindScan = false;
     int32_t blindScanDev = 0;
     bool dumping = false;
+    bool dumpOpening = false;  // a start is making its file, outside the lock
     std::string dumpPath;
     int32_t dumpFrontend = 0;
     std::shared_ptr<Recording> dump;

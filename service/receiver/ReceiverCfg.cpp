@@ -246,19 +246,17 @@ int32_t ReceiverCfg::TSDumpStart(int32_t dev, int32_t, int32_t, const char* path
         if (!mRx->validFrontend(dev)) return kErrBadParameter;
         if (path == nullptr || memchr(path, 0, kTSDumpPathSize) == nullptr || path[0] == '\0')
             return kErrPath;
-        if (mRx->outputs.dumping) return kErrBusy;
+        if (mRx->outputs.dumping || mRx->outputs.dumpOpening) return kErrBusy;
         if (!mRx->frontends[dev].tuned) return kErrNotStarted;
+        // Held while the file is made outside the lock: a second start meanwhile is busy and
+        // never creates or truncates a file of its own.
+        mRx->outputs.dumpOpening = true;
     }
-    // The file is made outside the receiver's lock; the dump starts once it is there.
     int64_t since = mRx->clock().nowMillis();
     auto dump = Recording::create(path, mRx->broadcast(), nullptr, since);
-    if (dump == nullptr) return kErrPath;
-    RecordingStop unwanted;
     std::lock_guard<std::mutex> lock(mRx->mLock);
-    if (mRx->outputs.dumping) {
-        unwanted.write.recording = std::move(dump);
-        return kErrBusy;
-    }
+    mRx->outputs.dumpOpening = false;
+    if (dump == nullptr) return kErrPath;
     mRx->outputs.dumping = true;
     mRx->outputs.dumpPath = path;
     mRx->outputs.dumpFrontend = dev;
@@ -269,6 +267,9 @@ int32_t ReceiverCfg::TSDumpStart(int32_t dev, int32_t, int32_t, const char* path
 int32_t ReceiverCfg::TSDumpStop() {
     RecordingStop stop;
     std::lock_guard<std::mutex> lock(mRx->mLock);
+    // A dump still making its file has not started yet: stopping it now is busy, not "not
+    // started", so that a caller may try again.
+    if (mRx->outputs.dumpOpening) return kErrBusy;
     if (!mRx->outputs.dumping) return kErrNotStarted;
     mRx->outputs.dumping = false;
     // The file gets the packets up to now and is closed once the lock is released.

@@ -184,6 +184,9 @@ int32_t ReceiverStrm::SetSettings(int32_t handle, const STRM_Settings* settings)
         if (it == mRx->streams.end()) return kErrBadHandle;
         Stream& s = it->second;
         if (!s.started) return kErrNotStarted;
+        // Settings wait for the time shift file being made: a second file of the same second
+        // would truncate it, and a discarded one would remove it.
+        if (s.shiftOpening) return kErrBusy;
         bool live =
                 settings->playSpeed == 0 && settings->playSpeedDiv == 0 && settings->posTime == 0;
         if (!live && (settings->playSpeedDiv <= 0 || settings->posTime < 0))
@@ -206,28 +209,24 @@ int32_t ReceiverStrm::SetSettings(int32_t handle, const STRM_Settings* settings)
         since = now;
         service = s.service;
         path = mRx->recordingPath(s, now);
+        s.shiftOpening = true;
     }
     std::shared_ptr<Recording> recording =
             Recording::create(path, mRx->broadcast(), service, since);
     std::lock_guard<std::mutex> lock(mRx->mLock);
     auto it = mRx->streams.find(handle);
+    if (it != mRx->streams.end()) it->second.shiftOpening = false;
     if (it == mRx->streams.end() || !it->second.started || it->second.service != service) {
         // Closed, stopped or retuned meanwhile: the file is not wanted.
         stop.write.recording = std::move(recording);
         stop.discard = true;
         return it == mRx->streams.end() ? kErrBadHandle : kErrNotStarted;
     }
+    if (recording == nullptr) return kErrPath;
     Stream& s = it->second;
-    if (s.shifting) {
-        // Another call started time shift meanwhile: its recording stays.
-        stop.write.recording = std::move(recording);
-        stop.discard = true;
-    } else {
-        if (recording == nullptr) return kErrPath;
-        s.shifting = true;
-        s.shiftSince = since;
-        s.recording = std::move(recording);
-    }
+    s.shifting = true;
+    s.shiftSince = since;
+    s.recording = std::move(recording);
     s.settings = *settings;
     shift(s, *settings, mRx->clock().nowMillis());
     return kOk;
@@ -293,10 +292,11 @@ int32_t ReceiverStrm::GetStatus(int32_t handle, STRM_GetStatus* status) {
         status->pbendTime = static_cast<int32_t>((s.startedAt + loop) / 1000);
     }
     if (s.shifting) {
-        int64_t recorded = now - s.shiftSince;
+        // What the file holds so far: the service thread writes it as the clock moves. Play
+        // back reaches no further than that.
+        int64_t recorded = s.recording ? s.recording->millis() : 0;
         status->recstate = kPvrActive;
-        // What the file holds so far: the service thread writes it as the clock moves.
-        status->recduration = static_cast<int32_t>(s.recording ? s.recording->millis() / 1000 : 0);
+        status->recduration = static_cast<int32_t>(recorded / 1000);
         status->recsize = s.recording ? s.recording->bytes() : 0;
         const dvbmodel::Event* recEvent = dvbmodel::eventAt(svc, s.shiftSince / 1000);
         status->recevent = recEvent != nullptr ? recEvent->id : 0;

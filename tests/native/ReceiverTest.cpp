@@ -6,6 +6,10 @@
 #include <receiver/SubtitleData.h>
 #include <receiver/Teletext.h>
 
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
 #include <algorithm>
 #include <cmath>
 #include <cstdlib>
@@ -14,6 +18,7 @@
 #include <fstream>
 #include <mutex>
 #include <set>
+#include <thread>
 #include <tuple>
 #include <vector>
 
@@ -401,6 +406,71 @@ TEST_F(ReceiverTest, AStreamPlaysWhatTheTransponderCarries) {
     strm->GetStatus(h, &st);
     EXPECT_EQ(std::make_tuple(st.recstate, st.recduration, st.pbstate, st.pbposition),
               std::make_tuple(kPvrActive, 20, kPvrPaused, 5));
+}
+
+// The disk fills up under time shift: the file keeps what it holds, and play back goes no
+// further than that.
+TEST_F(ReceiverTest, TimeShiftPlaysNoFurtherThanItsFileHolds) {
+    int32_t h;
+    ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
+    rx->recordDir = dir;
+    std::filesystem::create_symlink("/dev/full", rx->recordingPath(rx->streams.at(h), kStart));
+    STRM_Settings s{};
+    strm->GetSettings(h, &s);
+    s.playSpeed = 2, s.playSpeedDiv = 1, s.posTime = 0;
+    ASSERT_EQ(strm->SetSettings(h, &s), kOk);
+    advance(10000);
+    STRM_GetStatus st{};
+    strm->GetStatus(h, &st);
+    EXPECT_EQ(std::make_tuple(st.recduration, st.recsize, st.pbstate, st.pbposition),
+              std::make_tuple(0, 0, kPvrTrick, 0));
+}
+
+// A time shift or a dump still making its file (a FIFO opens once it is read) holds off a
+// second start, which makes no file (a second later, its own name), and a stop, which may try
+// again.
+TEST_F(ReceiverTest, AFileBeingMadeHoldsOffASecondStartAndAStop) {
+    int32_t h;
+    ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
+    rx->recordDir = dir;
+    const std::string dump = dir + "/dump", other = dir + "/other.ts";
+    STRM_Settings shift{}, live{};
+    strm->GetSettings(h, &shift);
+    shift.playSpeed = shift.playSpeedDiv = 1;
+    const Stream& stream = rx->streams.at(h);
+    const struct {
+        std::string fifo, other;
+        std::function<int32_t()> start, second, stop;
+    } cases[] = {
+            {rx->recordingPath(stream, kStart), rx->recordingPath(stream, kStart + 1000),
+             [&] { return strm->SetSettings(h, &shift); },
+             [&] { return strm->SetSettings(h, &shift); },
+             [&] { return strm->SetSettings(h, &live); }},
+            {dump, other, [&] { return cfg->TSDumpStart(0, 0, 0, dump.c_str()); },
+             [&] { return cfg->TSDumpStart(0, 0, 0, other.c_str()); },
+             [&] { return cfg->TSDumpStop(); }},
+    };
+    for (const auto& c : cases) {
+        ASSERT_EQ(mkfifo(c.fifo.c_str(), 0600), 0);
+        int32_t first = 1;
+        std::thread starting([&] { first = c.start(); });
+        // Bounded only so that a fault fails instead of hanging; it takes microseconds.
+        for (int i = 0; i < 30000 && c.stop() != kErrBusy; ++i) usleep(1000);
+        rx->clock().advance(1000);
+        EXPECT_EQ(std::make_tuple(c.stop(), c.second()), std::make_tuple(kErrBusy, kErrBusy))
+                << c.fifo;
+        EXPECT_FALSE(std::filesystem::exists(c.other));
+        int fd = open(c.fifo.c_str(), O_RDONLY);
+        starting.join();
+        std::thread drain([fd] {
+            char b[4096];
+            while (read(fd, b, sizeof b) > 0) {
+            }
+        });
+        EXPECT_EQ(std::make_tuple(first, c.stop()), std::make_tuple(kOk, kOk)) << c.fifo;
+        drain.join();
+        close(fd);
+    }
 }
 
 TEST_F(ReceiverTest, BadInputGetsItsResult) {
