@@ -217,9 +217,8 @@ JNIEXPORT jlongArray JNICALL Java_android_DVB_Spy_liveDvbs(JNIEnv* env, jclass) 
 // when no such object lives.
 JNIEXPORT jint JNICALL Java_android_DVB_Spy_strongCount(JNIEnv*, jclass, jlong address) {
     for (const auto& dvb : dvbsvc::liveDvbs()) {
-        if (reinterpret_cast<uintptr_t>(dvb.get()) == static_cast<uint64_t>(address)) {
+        if (static_cast<jlong>(reinterpret_cast<uintptr_t>(dvb.get())) == address)
             return dvb->getStrongCount() - 1;
-        }
     }
     return -1;
 }

@@ -26,7 +26,6 @@ class CaptureEndToEndTest {
     static final DVB dvb = new DVB();
     static final List<int[]> events = Collections.synchronizedList(new ArrayList<>());
     static final Map<Integer, Scnm.SCNM_ServiceInfo> found = new TreeMap<>();
-    static Scnm.SCNM_StartSettings band;
     static final List<Scnm.SCNMNET_FrontEndSettings> transponders = new ArrayList<>();
 
     static {
@@ -64,7 +63,7 @@ class CaptureEndToEndTest {
         for (String end : new String[] {"", "-wal", "-shm"}) new File(db + end).delete();
         assertEquals(0, scnm.Dvb_SystemInit(new Scnm.DVB_Config()));
         long scan = scnm.Scnm_Open(new Scnm.SCNM_OpenSettings());
-        band = new Scnm.SCNM_StartSettings();
+        Scnm.SCNM_StartSettings band = new Scnm.SCNM_StartSettings();
         band.type = 2;
         band.bandwidth = 8000;
         band.scanType = 2;
@@ -82,14 +81,15 @@ class CaptureEndToEndTest {
             transponders.add(t);
         }
         scnm.Scnm_Close(scan);
-        // The French multiplex's own services: name and provider bytes as broadcast, LCN, type.
+        // The French multiplex's own services: type, name bytes as broadcast, LCN.
         Matcher m = Pattern.compile("\\{\"sid\": (\\d+), [^{]*?\"service_type\": (\\d+), [^{]*?\"name_hex\": \"(\\w*)\""
                 + "[^{]*?\"lcn\": \\{\"sid\": \\d+, \"visible\": \\d, \"lcn\": (\\d+)\\}").matcher(truth("fr-dvbt-multiplex-si"));
         int actual = 0;
         for (; m.find(); actual++) {
             Scnm.SCNM_ServiceInfo info = found.get(8442 << 16 | Integer.parseInt(m.group(1)));
             assertNotNull(info, "service " + m.group(1));
-            assertEquals(List.of(m.group(2), m.group(3), m.group(4)), List.of("" + info.svcType, hex(info.svcName), "" + info.lcn));
+            assertEquals(List.of(m.group(2), m.group(3), m.group(4)),
+                    List.of("" + info.svcType, hex(info.svcName), "" + info.lcn));
         }
         assertEquals(5, actual);
         // The other captures' services, by the name bytes their SDT broadcast (the damaged one's
@@ -186,8 +186,7 @@ class CaptureEndToEndTest {
         for (int i = 0; i < 2000 && data.numRegions == 0; i++, Thread.sleep(10)) sub.Subttl_GetData(decoder, data);
         BufferedImage want = ImageIO.read(new File(TESTDATA, "truth/dvbsub-canalplus-cinema.pid0157.set1.ffmpeg.png"));
         BufferedImage got = dvbdemo.DisplaySetImage.compose(sub, data);
-        int differ = EndToEnd.differing(want, got);
-        assertEquals(0, differ, "pixels that differ from ffmpeg's rendering");
+        assertEquals(0, EndToEnd.differing(want, got), "pixels that differ from ffmpeg's rendering");
         assertEquals(0, sub.Subttl_Stop(decoder));
         assertEquals(0, dvb.getStrm().Strm_Close(stream));
     }

@@ -203,9 +203,8 @@ class CacheTest extends SpyTestBase {
     /** The line Strm_GetAllEvent writes for item `k` of `ext`: its text, then its description. */
     static String itemLine(byte[] ext, int k) {
         byte[] item = Arrays.copyOfRange(ext, NOW.from(k), NOW.from(k) + 96);
-        Object d = Layout.javaValue(ITEM.slots.get(0), item);
-        Object t = Layout.javaValue(ITEM.slots.get(1), item);
-        return "2 STRM mExtEvtNow item: " + (t == null ? "" : t) + " itemDesc : " + (d == null ? "" : d);
+        return "2 STRM mExtEvtNow item: " + Objects.toString(Layout.javaValue(ITEM.slots.get(1), item), "")
+                + " itemDesc : " + Objects.toString(Layout.javaValue(ITEM.slots.get(0), item), "");
     }
 
     static int bounded(int count) {
@@ -239,8 +238,7 @@ class CacheTest extends SpyTestBase {
         for (int k = 0; k < 16; k++) {
             int from = k < bounded(count) ? 1 : k < before ? 0 : -1;
             byte[] now = k < bounded(-count) ? ext(5, 0) : from < 0 ? null : deliveries[from][0];
-            if (now != null) NOW.assertEntry(dvb, now, k);
-            if (now != null) DATABASE.assertEntry(dvb, now, k);
+            if (now != null) for (Reader r : List.of(NOW, DATABASE)) r.assertEntry(dvb, now, k);
             if (from >= 0) NEXT.assertEntry(dvb, deliveries[from][1], k);
         }
     }

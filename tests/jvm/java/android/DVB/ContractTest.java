@@ -168,10 +168,7 @@ class ContractTest extends SpyTestBase {
                 }
             }
         }
-        if (r.ret == WRITTEN) {
-            scripted[0] = le32(result);
-            Spy.setOut(r.op, r.opArgs.length - 1, 0, scripted[0]);
-        }
+        if (r.ret == WRITTEN) Spy.setOut(r.op, r.opArgs.length - 1, 0, scripted[0] = le32(result));
         Object got = call(module(dvb, r.cls), r.method, javaArgs);
 
         assertArrayEquals(r.opArgs, Spy.args(onlyCall(r.op)), "operation arguments");

@@ -74,8 +74,7 @@ class DvbTest extends SpyTestBase {
         assertEquals(List.of(2, 0), refs(), "the first binding's references went with it");
         dvb.release();
         assertEquals(List.of("delete object", "delete class"), List.of(Spy.takeGlobalRefEvents()));
-        assertEquals(0, dvb.nativeContext());
-        assertEquals(0, Spy.liveDvbs().length + Spy.liveListenerCount());
+        assertEquals(List.of(0, 0, 0), List.of(dvb.nativeContext(), Spy.liveDvbs().length, Spy.liveListenerCount()));
         assertEquals(lines(0, "release"), List.of(Spy.takeLogs()));
         dvb.release(); // an unbound object only logs
         assertEquals(lines(0, "release"), List.of(Spy.takeLogs()));

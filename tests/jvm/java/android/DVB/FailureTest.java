@@ -112,8 +112,7 @@ class FailureTest extends SpyTestBase {
 
     @Test
     void aReleasedContextNoLongerReachesItsObject() throws Throwable {
-        // A 32-bit context is the object's address, which the next object may well reuse.
-        assumeTrue(WIDE);
+        assumeTrue(WIDE, "a 32-bit context is the object's address, which the next object may well reuse");
         Cfg stale = dvb.getCfg();
         dvb.release();
         dvb = new DVB();

@@ -2,8 +2,6 @@ package android.DVB;
 
 /** Every record of the service interface, as the interface description lays it out. */
 final class Records {
-    private Records() {}
-
     static final Layout ANT_FRONTEND = new Layout(Cfg.ANT_FrontendParameters.class, 76, "x:fe@0");
     static final Layout ANT_STATUS = new Layout(Cfg.ANT_Status.class, 16,
             "feStatus:i32@0 strength:i32@4 quality:i32@12");

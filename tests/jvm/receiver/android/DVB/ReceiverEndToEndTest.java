@@ -232,9 +232,9 @@ class ReceiverEndToEndTest {
         } catch (IOException noFfmpeg) {
             return frames;
         }
-        File[] pngs = dir.listFiles((d, name) -> name.endsWith(".png"));
-        Arrays.sort(pngs);
-        for (File f : pngs) frames.add(ImageIO.read(f));
+        for (File f : new TreeSet<>(List.of(dir.listFiles((d, name) -> name.endsWith(".png"))))) {
+            frames.add(ImageIO.read(f));
+        }
         assertFalse(frames.isEmpty(), "ffmpeg rendered no frame");
         return frames;
     }
