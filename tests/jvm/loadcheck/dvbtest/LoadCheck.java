@@ -1,10 +1,7 @@
 package dvbtest;
 
-import java.lang.reflect.InvocationTargetException;
-import java.lang.reflect.Method;
-import java.lang.reflect.Modifier;
-import java.util.Arrays;
-import java.util.List;
+import java.lang.reflect.*;
+import java.util.*;
 
 /**
  * Loads libDVBjni in a JVM of its own, on a class path where the API classes may be altered,
@@ -34,6 +31,10 @@ public final class LoadCheck {
         {"no-post-event", "Can't find DVB.postEventFromNative", DVB, CFG, INIT},
         {"no-fields", null, DVB, CFG, INIT},
     };
+
+    /** Arguments of the types that are not record classes. */
+    static final Map<Class<?>, Object> PLAIN =
+            Map.of(int.class, 0, long.class, 0L, boolean.class, false, String.class, "x", byte[].class, new byte[16]);
 
     static native String[] takeLogs();
 
@@ -79,7 +80,10 @@ public final class LoadCheck {
                     continue;
                 }
                 Object[] values = new Object[types.size()];
-                for (int i = 0; i < values.length; i++) values[i] = valueOf(types.get(i));
+                for (int i = 0; i < values.length; i++) {
+                    Class<?> t = types.get(i);
+                    values[i] = PLAIN.containsKey(t) ? PLAIN.get(t) : t.getConstructor().newInstance();
+                }
                 try {
                     m.invoke(module, values);
                     fail(m.getName() + " returned normally");
@@ -91,15 +95,6 @@ public final class LoadCheck {
         }
         dvbClass.getMethod("release").invoke(dvb);
         if (checked != 42) fail(checked + " methods take a record object, expected 42");
-    }
-
-    static Object valueOf(Class<?> type) throws Exception {
-        if (type == int.class) return 0;
-        if (type == long.class) return 0L;
-        if (type == boolean.class) return false;
-        if (type == String.class) return "x";
-        if (type == byte[].class) return new byte[16];
-        return type.getConstructor().newInstance();
     }
 
     static void fail(String message) {

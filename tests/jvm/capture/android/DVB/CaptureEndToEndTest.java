@@ -9,8 +9,7 @@ import java.nio.charset.StandardCharsets;
 import java.nio.file.Files;
 import java.time.Instant;
 import java.util.*;
-import java.util.regex.Matcher;
-import java.util.regex.Pattern;
+import java.util.regex.*;
 import javax.imageio.ImageIO;
 import org.junit.jupiter.api.*;
 
@@ -27,7 +26,6 @@ class CaptureEndToEndTest {
     static final DVB dvb = new DVB();
     static final List<int[]> events = Collections.synchronizedList(new ArrayList<>());
     static final Map<Integer, Scnm.SCNM_ServiceInfo> found = new TreeMap<>();
-    static Scnm.SCNM_StartSettings band;
     static final List<Scnm.SCNMNET_FrontEndSettings> transponders = new ArrayList<>();
 
     static {
@@ -51,14 +49,10 @@ class CaptureEndToEndTest {
                 .replaceAll("\\s*\n\\s*([\\]}])", "$1");
     }
 
-    static String hex(byte[] b, int length) {
+    static String hex(byte[] b) {
         StringBuilder s = new StringBuilder();
-        for (int i = 0; i < length && i < b.length && b[i] != 0; i++) s.append(String.format("%02x", b[i] & 0xFF));
+        for (int i = 0; i < b.length && b[i] != 0; i++) s.append(String.format("%02x", b[i] & 0xFF));
         return s.toString();
-    }
-
-    static int seconds(String utc) {
-        return (int) Instant.parse(utc).getEpochSecond();
     }
 
     @Test
@@ -69,7 +63,7 @@ class CaptureEndToEndTest {
         for (String end : new String[] {"", "-wal", "-shm"}) new File(db + end).delete();
         assertEquals(0, scnm.Dvb_SystemInit(new Scnm.DVB_Config()));
         long scan = scnm.Scnm_Open(new Scnm.SCNM_OpenSettings());
-        band = new Scnm.SCNM_StartSettings();
+        Scnm.SCNM_StartSettings band = new Scnm.SCNM_StartSettings();
         band.type = 2;
         band.bandwidth = 8000;
         band.scanType = 2;
@@ -87,7 +81,7 @@ class CaptureEndToEndTest {
             transponders.add(t);
         }
         scnm.Scnm_Close(scan);
-        // The French multiplex's own services: name and provider bytes as broadcast, LCN, type.
+        // The French multiplex's own services: type, name bytes as broadcast, LCN.
         Matcher m = Pattern.compile("\\{\"sid\": (\\d+), [^{]*?\"service_type\": (\\d+), [^{]*?\"name_hex\": \"(\\w*)\""
                 + "[^{]*?\"lcn\": \\{\"sid\": \\d+, \"visible\": \\d, \"lcn\": (\\d+)\\}").matcher(truth("fr-dvbt-multiplex-si"));
         int actual = 0;
@@ -95,7 +89,7 @@ class CaptureEndToEndTest {
             Scnm.SCNM_ServiceInfo info = found.get(8442 << 16 | Integer.parseInt(m.group(1)));
             assertNotNull(info, "service " + m.group(1));
             assertEquals(List.of(m.group(2), m.group(3), m.group(4)),
-                    List.of("" + info.svcType, hex(info.svcName, info.svcName.length), "" + info.lcn));
+                    List.of("" + info.svcType, hex(info.svcName), "" + info.lcn));
         }
         assertEquals(5, actual);
         // The other captures' services, by the name bytes their SDT broadcast (the damaged one's
@@ -105,8 +99,8 @@ class CaptureEndToEndTest {
                     .matcher(truth(capture).substring(truth(capture).indexOf("\"services_summary\"")));
             assertTrue(s.find(), capture);
             int sid = Integer.parseInt(s.group(1));
-            assertTrue(found.values().stream().anyMatch(i -> i.svcId == sid
-                    && hex(i.svcName, i.svcName.length).equals(s.group(2))), capture + " service " + sid);
+            assertTrue(found.values().stream().anyMatch(i -> i.svcId == sid && hex(i.svcName).equals(s.group(2))),
+                    capture + " service " + sid);
         }
     }
 
@@ -150,7 +144,7 @@ class CaptureEndToEndTest {
             Matcher m = event.matcher(schedule.substring(schedule.indexOf("tsid=4 sid=" + sid)));
             for (int count = Integer.parseInt(firstGroup(schedule.substring(schedule.indexOf("tsid=4 sid=" + sid)),
                     "\"unique_event_count\": (\\d+)")); count > 0 && m.find(); count--) {
-                int start = seconds(m.group(2));
+                int start = (int) Instant.parse(m.group(2)).getEpochSecond();
                 int duration = Integer.parseInt(m.group(3)) * 3600 + Integer.parseInt(m.group(4)) * 60
                         + Integer.parseInt(m.group(5));
                 // The record holds 51 bytes of a name.
@@ -160,7 +154,7 @@ class CaptureEndToEndTest {
             Strm.EpgEvent e = new Strm.EpgEvent();
             for (int i = 0; i < 200 && strm.EPG_GetEvent(stream, svc, e, new Strm.ExtEpgEvent()) == 0
                     && got.size() < want.size(); i++) {
-                got.add(e.evtId + " " + e.startTime + " " + e.duration + " " + hex(e.name, e.name.length));
+                got.add(e.evtId + " " + e.startTime + " " + e.duration + " " + hex(e.name));
             }
             assertEquals(want, got, "schedule of " + sid);
             assertEquals(0, strm.Strm_Close(stream));
@@ -192,8 +186,7 @@ class CaptureEndToEndTest {
         for (int i = 0; i < 2000 && data.numRegions == 0; i++, Thread.sleep(10)) sub.Subttl_GetData(decoder, data);
         BufferedImage want = ImageIO.read(new File(TESTDATA, "truth/dvbsub-canalplus-cinema.pid0157.set1.ffmpeg.png"));
         BufferedImage got = dvbdemo.DisplaySetImage.compose(sub, data);
-        int differ = EndToEnd.differing(want, got);
-        assertEquals(0, differ, "pixels that differ from ffmpeg's rendering");
+        assertEquals(0, EndToEnd.differing(want, got), "pixels that differ from ffmpeg's rendering");
         assertEquals(0, sub.Subttl_Stop(decoder));
         assertEquals(0, dvb.getStrm().Strm_Close(stream));
     }

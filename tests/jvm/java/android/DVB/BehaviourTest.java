@@ -3,6 +3,7 @@ package android.DVB;
 import static org.junit.jupiter.api.Assertions.*;
 
 import java.io.File;
+import java.nio.charset.StandardCharsets;
 import java.util.*;
 import java.util.concurrent.atomic.AtomicInteger;
 import org.junit.jupiter.api.*;
@@ -20,9 +21,7 @@ class BehaviourTest extends SpyTestBase {
     }
 
     static String ascii(int length) {
-        StringBuilder s = new StringBuilder();
-        for (int i = 0; i < length; i++) s.append((char) ('a' + i % 26));
-        return s.toString();
+        return "abcdefghijklmnopqrstuvwxyz".repeat(12).substring(0, length);
     }
 
     @ParameterizedTest
@@ -33,13 +32,8 @@ class BehaviourTest extends SpyTestBase {
         int call = onlyCall("Cfg::TSDumpStart");
         assertArrayEquals(new long[] {1, 2, 3, 0}, Spy.args(call));
         byte[] want = new byte[256];
-        System.arraycopy(Layout.utf8(ascii(length)), 0, want, 0, Math.min(length, 255));
+        System.arraycopy(ascii(length).getBytes(StandardCharsets.US_ASCII), 0, want, 0, Math.min(length, 255));
         assertArrayEquals(want, Spy.record(call, 0));
-    }
-
-    /** The byte the spy's decoder holds at `position` of its data. */
-    static byte teletextByte(long position) {
-        return (byte) ((position * 31 + 7) ^ (position >> 8));
     }
 
     /** Count, then the pieces the module must be asked for: offset, size, offset, size... */
@@ -57,10 +51,9 @@ class BehaviourTest extends SpyTestBase {
             assertArrayEquals(new long[] {LOW, Long.parseLong(p[2 * i]), Long.parseLong(p[2 * i + 1]), 0},
                     Spy.args(i), "piece " + i);
         }
-        for (int i = 0; i < data.length; i++) {
-            byte want = i < 10 ? 0 : teletextByte(i - 10);
-            if (data[i] != want) assertEquals(want, data[i], "element " + i);
-        }
+        byte[] want = new byte[count + 10]; // from 10 on, what the spy's decoder holds
+        for (int at = 0; at < count; at++) want[10 + at] = (byte) ((at * 31 + 7) ^ (at >> 8));
+        assertArrayEquals(want, data);
     }
 
     @Test
@@ -80,7 +73,7 @@ class BehaviourTest extends SpyTestBase {
     @CsvSource({"128, 128", "300, 300", "64, 128"})
     void aStreamPathThatDoesNotFitIsRefused(int chars, int bytes) {
         Strm.STRM_OpenSettings o = new Strm.STRM_OpenSettings();
-        o.szPath = chars == bytes ? ascii(chars) : new String(new char[chars]).replace('\0', '\u00e9');
+        o.szPath = chars == bytes ? ascii(chars) : "\u00e9".repeat(chars);
         IllegalArgumentException e = assertThrows(IllegalArgumentException.class,
                 () -> dvb.getStrm().Strm_Open(o));
         assertEquals("STRM_OpenSettings.szPath is " + bytes + " bytes; at most 127 fit",
@@ -102,22 +95,18 @@ class BehaviourTest extends SpyTestBase {
         assertEquals("a\uFFFDb\u0000\uFFFD\uFFFDc\uFFFD", a.streamName);
     }
 
-    static Scnm.DVB_Config config() {
-        Scnm.DVB_Config c = new Scnm.DVB_Config();
-        c.displayMode = 1080;
-        c.sdkMode = -2;
-        return c;
-    }
-
     @Test
     void systemStartUpWaitsForTheEventDatabaseAndShutDownNever() throws Exception {
         Scnm s = dvb.getScnm();
+        Scnm.DVB_Config config = new Scnm.DVB_Config();
+        config.displayMode = 1080;
+        config.sdkMode = -2;
         Spy.setResult("Scnm::Dvb_SystemUnInit", -3);
-        assertEquals(0, (int) assertTimeoutPreemptively(NO_HANG, () -> s.Dvb_SystemUnInit(config())));
+        assertEquals(0, (int) assertTimeoutPreemptively(NO_HANG, () -> s.Dvb_SystemUnInit(config)));
         assertFalse(EPG_DB.exists());
         AtomicInteger result = new AtomicInteger(99);
         Spy.setResult("Scnm::Dvb_SystemInit", -3);
-        Thread caller = new Thread(() -> result.set(s.Dvb_SystemInit(config())));
+        Thread caller = new Thread(() -> result.set(s.Dvb_SystemInit(config)));
         caller.start();
         while (Spy.callCount() < 2 && caller.isAlive()) Thread.sleep(5);
         Thread.sleep(600); // time enough for a call that does not wait to return
@@ -126,10 +115,9 @@ class BehaviourTest extends SpyTestBase {
         caller.join(NO_HANG.toMillis());
         assertFalse(caller.isAlive(), "still waiting although the database exists");
         assertEquals(0, result.get());
-        assertEquals(0, (int) assertTimeoutPreemptively(NO_HANG, () -> s.Dvb_SystemInit(config())));
-        assertEquals(Arrays.asList("Scnm::Dvb_SystemUnInit", "Scnm::Dvb_SystemInit",
-                "Scnm::Dvb_SystemInit"), ops());
+        assertEquals(0, (int) assertTimeoutPreemptively(NO_HANG, () -> s.Dvb_SystemInit(config)));
+        assertEquals(List.of("Scnm::Dvb_SystemUnInit", "Scnm::Dvb_SystemInit", "Scnm::Dvb_SystemInit"), ops());
         for (int call = 0; call < 3; call++) assertArrayEquals(le32(1080, -2), Spy.record(call, 0));
-        assertEquals(Arrays.asList(GETTER, GETTER, GETTER), logs());
+        assertEquals(List.of(GETTER, GETTER, GETTER), logs());
     }
 }

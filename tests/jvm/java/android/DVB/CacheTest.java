@@ -5,7 +5,7 @@ import static org.junit.jupiter.api.Assertions.*;
 
 import java.util.*;
 import java.util.function.ToIntFunction;
-import java.util.stream.Stream;
+import java.util.stream.*;
 import org.junit.jupiter.api.*;
 import org.junit.jupiter.params.ParameterizedTest;
 import org.junit.jupiter.params.provider.*;
@@ -69,14 +69,10 @@ class CacheTest extends SpyTestBase {
             display("Subttl_GetPageData", PAGE, i -> 8, 1),
             display("Subttl_GetRegionDefData", REGION_DEF, i -> 28 + i[1] * 12, 1, 16),
             display("Subttl_GetRegionData", REGION, i -> 224 + i[0] * 385000, 5),
-            display("Subttl_GetRegionObjectDefData", OBJECT_DEF, i -> objectDef(i[0], i[1]), 5, 16),
+            display("Subttl_GetRegionObjectDefData", OBJECT_DEF, i -> 224 + i[0] * 385000 + 384040 + i[1] * 60, 5, 16),
             display("Subttl_GetClutData", CLUT, i -> 1925228 + i[0] * 1106, 4),
             display("Subttl_GetDefaultClutData", CLUT, i -> 1929684),
             display("Subttl_GetDisplayData", DISPLAY, i -> 1929652));
-
-    static int objectDef(int r, int o) {
-        return 224 + r * 385000 + 384040 + o * 60;
-    }
 
     static List<Reader> readers() {
         return Stream.of(List.of(SERVICE, NET, NOW, NEXT, DATABASE), LISTS, DISPLAY_READERS)
@@ -109,9 +105,7 @@ class CacheTest extends SpyTestBase {
     /** A scan list: its create method, exported cache, reader and the offset of its link. */
     record ScanList(String method, String cache, Reader reader, int link) {
         byte[][] nodes(int first, int count) {
-            byte[][] n = new byte[count][];
-            for (int i = 0; i < count; i++) n[i] = reader.layout.pattern(first + i);
-            return n;
+            return IntStream.range(first, first + count).mapToObj(reader.layout::pattern).toArray(byte[][]::new);
         }
 
         int create(DVB dvb, byte[][] nodes) throws Throwable {
@@ -209,9 +203,8 @@ class CacheTest extends SpyTestBase {
     /** The line Strm_GetAllEvent writes for item `k` of `ext`: its text, then its description. */
     static String itemLine(byte[] ext, int k) {
         byte[] item = Arrays.copyOfRange(ext, NOW.from(k), NOW.from(k) + 96);
-        Object d = Layout.javaValue(ITEM.slots.get(0), item);
-        Object t = Layout.javaValue(ITEM.slots.get(1), item);
-        return "2 STRM mExtEvtNow item: " + (t == null ? "" : t) + " itemDesc : " + (d == null ? "" : d);
+        return "2 STRM mExtEvtNow item: " + Objects.toString(Layout.javaValue(ITEM.slots.get(1), item), "")
+                + " itemDesc : " + Objects.toString(Layout.javaValue(ITEM.slots.get(0), item), "");
     }
 
     static int bounded(int count) {
@@ -228,10 +221,8 @@ class CacheTest extends SpyTestBase {
         byte[][][] deliveries = {{ext(1, before), ext(2, before)}, {ext(3, count), ext(4, count)}};
         for (byte[][] pair : deliveries) {
             Spy.reset();
-            Spy.setOut("Strm::GetAllEvent", 3, 0, pair[0]);
-            Spy.setOut("Strm::GetAllEvent", 4, 0, pair[1]);
-            Strm.ExtEpgEvent now = new Strm.ExtEpgEvent();
-            Strm.ExtEpgEvent next = new Strm.ExtEpgEvent();
+            for (int p = 0; p < 2; p++) Spy.setOut("Strm::GetAllEvent", 3 + p, 0, pair[p]);
+            Strm.ExtEpgEvent now = new Strm.ExtEpgEvent(), next = new Strm.ExtEpgEvent();
             dvb.getStrm().Strm_GetAllEvent(0, new Strm.EpgEvent(), new Strm.EpgEvent(), now, next);
             int told = bounded(le(pair[0]).getInt(0));
             assertEquals(List.of(told, told), List.of(now.itemCount, next.itemCount));
@@ -247,8 +238,7 @@ class CacheTest extends SpyTestBase {
         for (int k = 0; k < 16; k++) {
             int from = k < bounded(count) ? 1 : k < before ? 0 : -1;
             byte[] now = k < bounded(-count) ? ext(5, 0) : from < 0 ? null : deliveries[from][0];
-            if (now != null) NOW.assertEntry(dvb, now, k);
-            if (now != null) DATABASE.assertEntry(dvb, now, k);
+            if (now != null) for (Reader r : List.of(NOW, DATABASE)) r.assertEntry(dvb, now, k);
             if (from >= 0) NEXT.assertEntry(dvb, deliveries[from][1], k);
         }
     }
@@ -265,9 +255,7 @@ class CacheTest extends SpyTestBase {
     void assertReadersSee(byte[] data) throws Throwable {
         for (Reader r : DISPLAY_READERS) {
             r.assertEntry(dvb, data, new int[r.rooms.length]);
-            int[] last = r.rooms.clone();
-            for (int i = 0; i < last.length; i++) last[i]--;
-            r.assertEntry(dvb, data, last);
+            r.assertEntry(dvb, data, Arrays.stream(r.rooms).map(room -> room - 1).toArray());
         }
     }
 
@@ -318,12 +306,8 @@ class CacheTest extends SpyTestBase {
         assertEquals(0, dvb.getSubttl().Subttl_GetRegionData(2, r));
         le(data).putInt(16, toldWidth).putInt(20, toldHeight);
         new Layout(Subttl.SUBTTL_Region_t.class, 36, REGION_HEAD).assertJava(data, r, r);
-        if (pixels < 0) {
-            assertSame(before, r.p_pixbuf);
-            assertEquals(-99, r.i_object_defs);
-        } else {
-            assertArrayEquals(Arrays.copyOfRange(data, 36, 36 + pixels), r.p_pixbuf);
-            assertEquals(le(data).getInt(384036), r.i_object_defs);
-        }
+        assertEquals(pixels < 0 ? -99 : le(data).getInt(384036), r.i_object_defs);
+        if (pixels < 0) assertSame(before, r.p_pixbuf);
+        else assertArrayEquals(Arrays.copyOfRange(data, 36, 36 + pixels), r.p_pixbuf);
     }
 }

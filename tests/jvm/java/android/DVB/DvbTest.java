@@ -24,9 +24,8 @@ class DvbTest extends SpyTestBase {
     /** The only live DVB object, which only the Java object holds, with the only listener. */
     static long onlyDvb() {
         long[] live = Spy.liveDvbs();
-        assertEquals(1, live.length, "live DVB objects");
-        assertEquals(1, Spy.strongCount(live[0]), "the Java object's reference only");
-        assertEquals(1, Spy.liveListenerCount(), "an earlier listener went with its object");
+        assertEquals(List.of(1, 1, 1), List.of(live.length, Spy.strongCount(live[0]), Spy.liveListenerCount()),
+                "live objects, references to it (the Java object's only), listeners (earlier ones gone)");
         return live[0];
     }
 
@@ -45,13 +44,9 @@ class DvbTest extends SpyTestBase {
 
     /** Global references made on the test and service threads, and made minus deleted. */
     static List<Integer> refs() {
-        int made = 0;
-        int balance = 0;
-        for (String e : Spy.takeGlobalRefEvents()) {
-            made += e.startsWith("new") ? 1 : 0;
-            balance += e.startsWith("new") ? 1 : -1;
-        }
-        return List.of(made, balance);
+        String[] events = Spy.takeGlobalRefEvents();
+        int made = (int) Arrays.stream(events).filter(e -> e.startsWith("new")).count();
+        return List.of(made, 2 * made - events.length);
     }
 
     @Test
@@ -79,8 +74,7 @@ class DvbTest extends SpyTestBase {
         assertEquals(List.of(2, 0), refs(), "the first binding's references went with it");
         dvb.release();
         assertEquals(List.of("delete object", "delete class"), List.of(Spy.takeGlobalRefEvents()));
-        assertEquals(0, dvb.nativeContext());
-        assertEquals(0, Spy.liveDvbs().length + Spy.liveListenerCount());
+        assertEquals(List.of(0, 0, 0), List.of(dvb.nativeContext(), Spy.liveDvbs().length, Spy.liveListenerCount()));
         assertEquals(lines(0, "release"), List.of(Spy.takeLogs()));
         dvb.release(); // an unbound object only logs
         assertEquals(lines(0, "release"), List.of(Spy.takeLogs()));
@@ -106,8 +100,7 @@ class DvbTest extends SpyTestBase {
             Spy.raise(1, 2, 3, 3, 1);
             assertEquals(6, got.size(), "a throwing listener loses no later event");
             for (Object[] e : got) {
-                assertEquals(List.of(1, 2, 3), Arrays.asList(e[1], e[2], e[3]));
-                assertNull(e[4]);
+                assertEquals(Arrays.asList(1, 2, 3, null), Arrays.asList(e[1], e[2], e[3], e[4]));
                 assertNotEquals(Thread.currentThread(), e[5], "delivered on the service's thread");
             }
             assertEquals(3, got.stream().filter(e -> e[0] == dvb).count());
@@ -138,11 +131,9 @@ class DvbTest extends SpyTestBase {
             RuntimeException e = assertThrows(RuntimeException.class, () -> {
                 while (bound.size() <= 4096) bound.add(new DVB());
             });
-            assertEquals(RuntimeException.class, e.getClass());
-            assertEquals("Out of memory", e.getMessage());
-            assertEquals(4096, bound.size());
-            assertEquals(4096, Spy.liveDvbs().length, "the refused object is gone");
-            assertEquals(4096, Spy.liveListenerCount(), "and its listener with it");
+            assertEquals("java.lang.RuntimeException: Out of memory", e.toString());
+            assertEquals(List.of(4096, 4096, 4096), List.of(bound.size(), Spy.liveDvbs().length,
+                    Spy.liveListenerCount()), "bound; live objects and listeners, the refused one's gone");
             assertEquals(List.of(2 * 4097, 2 * 4096), refs(), "the refused listener's references too");
         } finally {
             bound.forEach(DVB::release);

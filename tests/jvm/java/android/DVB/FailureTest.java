@@ -16,13 +16,12 @@ import org.junit.jupiter.params.provider.*;
  */
 class FailureTest extends SpyTestBase {
     static List<Method> natives(Class<?> cls) {
-        List<Method> out = new ArrayList<>();
-        for (Method m : cls.getDeclaredMethods()) {
-            if (Modifier.isNative(m.getModifiers())) out.add(m);
-        }
-        out.sort(Comparator.comparing(Method::getName));
-        return out;
+        return Arrays.stream(cls.getDeclaredMethods()).filter(m -> Modifier.isNative(m.getModifiers()))
+                .sorted(Comparator.comparing(Method::getName)).toList();
     }
+
+    static final Map<Class<?>, Object> PLAIN = Map.of(int.class, 0, long.class, 0L, boolean.class, false,
+            String.class, "x", byte[].class, new byte[8]);
 
     /** Arguments for `m`: zeros, and fresh objects whose strings are set; null at `nullAt`. */
     static Object[] args(Method m, int nullAt) throws ReflectiveOperationException {
@@ -31,21 +30,10 @@ class FailureTest extends SpyTestBase {
         for (int i = 0; i < types.length; i++) {
             Class<?> t = types[i];
             if (i == nullAt) continue;
-            if (t == int.class) values[i] = 0;
-            else if (t == long.class) values[i] = 0L;
-            else if (t == boolean.class) values[i] = false;
-            else if (t == String.class) values[i] = "x";
-            else if (t == byte[].class) values[i] = new byte[8];
-            else values[i] = withStrings(t.getDeclaredConstructor().newInstance());
+            values[i] = PLAIN.containsKey(t) ? PLAIN.get(t) : t.getDeclaredConstructor().newInstance();
+            for (Field f : t.getFields()) if (f.getType() == String.class) f.set(values[i], "abc");
         }
         return values;
-    }
-
-    static Object withStrings(Object o) throws IllegalAccessException {
-        for (Field f : o.getClass().getFields()) {
-            if (f.getType() == String.class) f.set(o, "abc");
-        }
-        return o;
     }
 
     /** The lines a call of `method` writes when its module is out of reach. */
@@ -106,10 +94,7 @@ class FailureTest extends SpyTestBase {
             for (int i = 0; i < r.args().length; i++) {
                 if (!(r.args()[i] instanceof ContractTest.Rec rec) || !rec.in()) continue;
                 for (Layout.Slot s : rec.layout().slots) {
-                    if (s.field() == null || s.field().getType() != String.class
-                            || s.kind().equals("eng")) {
-                        continue;
-                    }
+                    if (s.field() == null || s.field().getType() != String.class || s.kind().equals("eng")) continue;
                     Object[] values = r.args().clone();
                     for (int k = 0; k < values.length; k++) {
                         if (values[k] instanceof ContractTest.Rec x) values[k] = x.layout().fill(x.layout().create(), 1);
@@ -127,8 +112,7 @@ class FailureTest extends SpyTestBase {
 
     @Test
     void aReleasedContextNoLongerReachesItsObject() throws Throwable {
-        // A 32-bit context is the object's address, which the next object may well reuse.
-        assumeTrue(WIDE);
+        assumeTrue(WIDE, "a 32-bit context is the object's address, which the next object may well reuse");
         Cfg stale = dvb.getCfg();
         dvb.release();
         dvb = new DVB();

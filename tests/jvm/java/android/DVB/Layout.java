@@ -84,10 +84,6 @@ final class Layout {
         return s.toString();
     }
 
-    static byte[] utf8(String s) {
-        return s.getBytes(StandardCharsets.UTF_8);
-    }
-
     /** Sets every mapped field of `o` (every int of a front-end block) from `seed`. */
     Object fill(Object o, int seed) throws ReflectiveOperationException {
         int k = 0;
@@ -110,35 +106,31 @@ final class Layout {
     }
 
     /** Lays `o` over `record`, as the library must build the record from it. */
-    byte[] toRecord(Object o, byte[] record) {
+    byte[] toRecord(Object o, byte[] record) throws ReflectiveOperationException {
         ByteBuffer b = ByteBuffer.wrap(record).order(ByteOrder.LITTLE_ENDIAN);
-        try {
-            for (Slot s : slots) {
-                int at = s.offset;
-                switch (s.kind) {
-                    case "fe" -> {
-                        int[] v = new int[FE.length];
-                        for (int i = 0; i < v.length; i++) v[i] = cls.getField(FE[i]).getInt(o);
-                        int code = v[0] == 1 || v[0] == 2 ? v[0] : 0; // every other type is 0
-                        b.putInt(at, code).putInt(at + 4, v[1]);
-                        if (code == 2) b.putInt(at + 8, v[7]);
-                        for (int i = 0; code != 2 && i < (code == 0 ? 5 : 3); i++) b.putInt(at + 8 + 4 * i, v[2 + i]);
-                    }
-                    case "i32" -> b.putInt(at, s.field.getInt(o));
-                    case "u8" -> b.put(at, (byte) s.field.getInt(o));
-                    case "u16", "s16" -> b.putShort(at, (short) s.field.getInt(o));
-                    case "u32j" -> b.putInt(at, (int) s.field.getLong(o));
-                    case "i64" -> b.putLong(at, s.field.getLong(o));
-                    default -> {
-                        String v = (String) s.field.get(o);
-                        byte[] t = utf8(v == null ? "eng" : v);
-                        Arrays.fill(record, at, at + s.width, (byte) 0);
-                        System.arraycopy(t, 0, record, at, Math.min(t.length, s.kind.matches("lang|eng") ? 3 : s.width));
-                    }
+        for (Slot s : slots) {
+            int at = s.offset;
+            switch (s.kind) {
+                case "fe" -> {
+                    int[] v = new int[FE.length];
+                    for (int i = 0; i < v.length; i++) v[i] = cls.getField(FE[i]).getInt(o);
+                    int code = v[0] == 1 || v[0] == 2 ? v[0] : 0; // every other type is 0
+                    b.putInt(at, code).putInt(at + 4, v[1]);
+                    if (code == 2) b.putInt(at + 8, v[7]);
+                    for (int i = 0; code != 2 && i < (code == 0 ? 5 : 3); i++) b.putInt(at + 8 + 4 * i, v[2 + i]);
+                }
+                case "i32" -> b.putInt(at, s.field.getInt(o));
+                case "u8" -> b.put(at, (byte) s.field.getInt(o));
+                case "u16", "s16" -> b.putShort(at, (short) s.field.getInt(o));
+                case "u32j" -> b.putInt(at, (int) s.field.getLong(o));
+                case "i64" -> b.putLong(at, s.field.getLong(o));
+                default -> {
+                    String v = (String) s.field.get(o);
+                    byte[] t = (v == null ? "eng" : v).getBytes(StandardCharsets.UTF_8);
+                    Arrays.fill(record, at, at + s.width, (byte) 0);
+                    System.arraycopy(t, 0, record, at, Math.min(t.length, s.kind.matches("lang|eng") ? 3 : s.width));
                 }
             }
-        } catch (ReflectiveOperationException e) {
-            throw new AssertionError(e);
         }
         return record;
     }
@@ -173,20 +165,16 @@ final class Layout {
     }
 
     /** Each mapped Java field of `o` holds what `record` says; the others still equal `kept`'s. */
-    void assertJava(byte[] record, Object o, Object kept) {
+    void assertJava(byte[] record, Object o, Object kept) throws IllegalAccessException {
         List<Field> mapped = new ArrayList<>();
-        try {
-            for (Slot s : slots) {
-                if (s.field == null) continue;
-                mapped.add(s.field);
-                assertEquals(Arrays.deepToString(new Object[] {javaValue(s, record)}),
-                        Arrays.deepToString(new Object[] {s.field.get(o)}), s.field.getName());
-            }
-            for (Field f : cls.getFields()) {
-                if (!mapped.contains(f)) assertEquals(f.get(kept), f.get(o), "unmapped " + f.getName());
-            }
-        } catch (IllegalAccessException e) {
-            throw new AssertionError(e);
+        for (Slot s : slots) {
+            if (s.field == null) continue;
+            mapped.add(s.field);
+            assertEquals(Arrays.deepToString(new Object[] {javaValue(s, record)}),
+                    Arrays.deepToString(new Object[] {s.field.get(o)}), s.field.getName());
+        }
+        for (Field f : cls.getFields()) {
+            if (!mapped.contains(f)) assertEquals(f.get(kept), f.get(o), "unmapped " + f.getName());
         }
     }
 

@@ -2,9 +2,6 @@ package android.DVB;
 
 /** Every record of the service interface, as the interface description lays it out. */
 final class Records {
-    private Records() {}
-
-    // Configuration module
     static final Layout ANT_FRONTEND = new Layout(Cfg.ANT_FrontendParameters.class, 76, "x:fe@0");
     static final Layout ANT_STATUS = new Layout(Cfg.ANT_Status.class, 16,
             "feStatus:i32@0 strength:i32@4 quality:i32@12");
@@ -13,7 +10,6 @@ final class Records {
     static final Layout VIDEO_POSITION = new Layout(Cfg.Video_Position.class, 16,
             "x:i32@0 y:i32@4 w:i32@8 h:i32@12");
 
-    // Scan module
     static final Layout SCNM_OPEN = new Layout(Scnm.SCNM_OpenSettings.class, 8,
             "frontend:i32@0 demux:i32@4");
     static final Layout SCNM_START = new Layout(Scnm.SCNM_StartSettings.class, 96,
@@ -107,7 +103,6 @@ final class Records {
     static final Layout CLUT = new Layout(Subttl.SUBTTL_Clut.class, 1106,
             "i_id:u8@0 i_version:u8@1 c_2b:ycc4@2 c_4b:ycc16@18 c_8b:ycc256@82");
 
-    // Teletext module
     /** Written through four pointers, in this order. */
     static final Layout NAV_PAGES = new Layout(Teltxt.TELTXT_NavPages.class, 16,
             "prev100:i32@0 prev10:i32@4 next10:i32@8 next100:i32@12");

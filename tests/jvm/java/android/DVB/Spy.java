@@ -7,8 +7,6 @@ final class Spy {
         System.loadLibrary("dvbtest");
     }
 
-    private Spy() {}
-
     static native void reset();
     static native int callCount();
     static native String op(int call);

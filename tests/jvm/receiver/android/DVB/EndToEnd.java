@@ -1,6 +1,7 @@
 package android.DVB;
 
 import java.awt.image.BufferedImage;
+import java.util.stream.IntStream;
 
 /**
  * What the end-to-end suites do alike: play a scanned service, name it to the event database,
@@ -65,12 +66,7 @@ final class EndToEnd {
                 int p = a.getRGB(x, y), q = b.getRGB(x, y);
                 if ((p >>> 24) == 0 && (q >>> 24) == 0) continue;
                 shown++;
-                for (int shift = 0; shift < 32; shift += 8) {
-                    if (Math.abs((p >>> shift & 0xFF) - (q >>> shift & 0xFF)) > 1) {
-                        differ++;
-                        break;
-                    }
-                }
+                if (IntStream.of(0, 8, 16, 24).anyMatch(s -> Math.abs((p >>> s & 0xFF) - (q >>> s & 0xFF)) > 1)) differ++;
             }
         }
         return shown == 0 ? -1 : differ;

@@ -18,7 +18,7 @@ final class ReceiverChild {
         dvb.getScnm().Dvb_SystemInit(new Scnm.DVB_Config());
         int[] e;
         while ((e = events.take())[0] != 230) continue;
-        say("open " + e[1]);
+        System.out.println("open " + e[1]);
         Strm strm = dvb.getStrm();
         for (int i = 1; i < args.length; i++) {
             String[] ids = args[i].split(":");
@@ -34,18 +34,13 @@ final class ReceiverChild {
             open.szPath = "";
             Strm.EpgEvent event = new Strm.EpgEvent();
             int result = strm.EPG_GetEvent(strm.Strm_Open(open), svc, event, new Strm.ExtEpgEvent());
-            say("event " + result + " " + event.evtId + " " + event.startTime);
+            System.out.println("event " + result + " " + event.evtId + " " + event.startTime);
         }
         while (args[0].equals("fill")) {
-            if ((e = events.take())[0] == 260) say("stored " + e[1]);
+            if ((e = events.take())[0] == 260) System.out.println("stored " + e[1]);
         }
         dvb.release();
         // The receiver's service thread is attached to this VM: leave without waiting for it.
         System.exit(0);
-    }
-
-    static void say(String line) {
-        System.out.println(line);
-        System.out.flush();
     }
 }

@@ -3,13 +3,9 @@ package android.DVB;
 import static org.junit.jupiter.api.Assertions.*;
 
 import java.awt.image.BufferedImage;
-import java.io.BufferedReader;
-import java.io.File;
-import java.io.IOException;
-import java.io.InputStreamReader;
+import java.io.*;
 import java.lang.management.ManagementFactory;
-import java.nio.ByteBuffer;
-import java.nio.ByteOrder;
+import java.nio.*;
 import java.nio.charset.StandardCharsets;
 import java.util.*;
 import javax.imageio.ImageIO;
@@ -77,15 +73,12 @@ class ReceiverEndToEndTest {
         s.scanType = 1;
         assertEquals(0, scnm.Scnm_Start(scan, s));
         assertEquals((int) scan, next(201).get(1));
-        int progress = -1;
+        List<Integer> progress;
         synchronized (events) {
-            for (List<Integer> e : events) {
-                if (e.get(0) != 200) continue;
-                assertTrue(e.get(2) >= progress, "progress only grows: " + events);
-                progress = e.get(2);
-            }
+            progress = events.stream().filter(e -> e.get(0) == 200).map(e -> e.get(2)).toList();
         }
-        assertEquals(100, progress);
+        assertEquals(progress.stream().sorted().toList(), progress, "progress only grows");
+        assertEquals(100, progress.get(progress.size() - 1));
         Scnm.SCNM_GetStatus st = new Scnm.SCNM_GetStatus();
         scnm.Scnm_GetStatus(scan, st);
         assertEquals(List.of(2, 100), List.of(st.result, st.sfStatus));
@@ -109,8 +102,7 @@ class ReceiverEndToEndTest {
     void aServicePlaysWithItsStatusComponentsAndEvents() throws InterruptedException {
         Strm strm = dvb.getStrm();
         stream = EndToEnd.play(strm, kanalEins, "deu", "eng", 506000);
-        Strm.STRM_GetStatus a = new Strm.STRM_GetStatus();
-        Strm.STRM_GetStatus b = new Strm.STRM_GetStatus();
+        Strm.STRM_GetStatus a = new Strm.STRM_GetStatus(), b = new Strm.STRM_GetStatus();
         for (int i = 0; i < 500 && (a.feStatus & 0x10) == 0; i++, Thread.sleep(10)) strm.Strm_GetStatus(stream, a);
         Thread.sleep(100);
         strm.Strm_GetStatus(stream, b);
@@ -126,8 +118,7 @@ class ReceiverEndToEndTest {
         strm.Strm_GetAudioStreamInfo(2, ac3);
         assertEquals(List.of(1, "deu"), List.of(ac3.isDolbyAC3, ac3.langCode0));
 
-        Strm.EpgEvent now = new Strm.EpgEvent();
-        Strm.EpgEvent following = new Strm.EpgEvent();
+        Strm.EpgEvent now = new Strm.EpgEvent(), following = new Strm.EpgEvent();
         Strm.ExtEpgEvent nowExt = new Strm.ExtEpgEvent();
         strm.Strm_GetAllEvent(stream, now, following, nowExt, new Strm.ExtEpgEvent());
         long clock = strm.Strm_GetTime(stream, 0);
@@ -167,8 +158,7 @@ class ReceiverEndToEndTest {
         BufferedImage shown = dvbdemo.DisplaySetImage.compose(sub, data);
         Thread.sleep(200);
         assertEquals(0, dvb.getCfg().Cfg_TSDumpStop());
-        List<Integer> differing = ffmpegFrames(dump, sc.pid).stream().map(f -> EndToEnd.differing(f, shown))
-                .collect(java.util.stream.Collectors.toList());
+        List<Integer> differing = ffmpegFrames(dump, sc.pid).stream().map(f -> EndToEnd.differing(f, shown)).toList();
         assertTrue(differing.isEmpty() || differing.contains(0), "ffmpeg renders what the readers give: " + differing);
         Subttl.SUBTTL_Region_t region = new Subttl.SUBTTL_Region_t();
         sub.Subttl_GetRegionData(0, region);
@@ -207,7 +197,7 @@ class ReceiverEndToEndTest {
         File db = new File(EPG_DB.getParent(), "killed-epg.db");
         for (String end : new String[] {"", "-wal", "-shm"}) new File(db + end).delete();
         Process fill = child(db, "fill", scanned);
-        BufferedReader out = new BufferedReader(new InputStreamReader(fill.getInputStream(), StandardCharsets.UTF_8));
+        BufferedReader out = fill.inputReader(StandardCharsets.UTF_8);
         assertEquals("open 0", out.readLine());
         String stored = out.readLine();
         fill.destroyForcibly().waitFor();
@@ -242,9 +232,9 @@ class ReceiverEndToEndTest {
         } catch (IOException noFfmpeg) {
             return frames;
         }
-        File[] pngs = dir.listFiles((d, name) -> name.endsWith(".png"));
-        Arrays.sort(pngs);
-        for (File f : pngs) frames.add(ImageIO.read(f));
+        for (File f : new TreeSet<>(List.of(dir.listFiles((d, name) -> name.endsWith(".png"))))) {
+            frames.add(ImageIO.read(f));
+        }
         assertFalse(frames.isEmpty(), "ffmpeg rendered no frame");
         return frames;
     }
@@ -267,10 +257,7 @@ class ReceiverEndToEndTest {
     }
 
     static List<String> lines(Process p) throws Exception {
-        List<String> all = new ArrayList<>();
-        try (BufferedReader r = new BufferedReader(new InputStreamReader(p.getInputStream(), StandardCharsets.UTF_8))) {
-            for (String line; (line = r.readLine()) != null; ) all.add(line);
-        }
+        List<String> all = p.inputReader(StandardCharsets.UTF_8).lines().toList();
         assertEquals(0, p.waitFor());
         return all;
     }
