@@ -3,6 +3,7 @@
 // operations only change the list and ask for a sync; they never write the database.
 #include <broadcast/DvbText.h>
 #include <algorithm>
+#include <unordered_map>
 
 #include "Receiver.h"
 
@@ -80,14 +81,15 @@ ScheduleStore storeSchedule(EpgDatabase& db, ServiceKey key, const dvbmodel::Ser
     if (!service.eitSections.empty()) {
         // A captured schedule goes in as it was received: its own sections and versions, so
         // that a new version replaces the events of that section and nothing else.
+        std::unordered_map<uint16_t, const dvbmodel::Event*> byId;
+        for (const dvbmodel::Event& e : service.events) byId.emplace(e.id, &e);  // the first
         std::vector<const dvbmodel::Event*> events;
         for (const dvbmodel::EitSection& s : service.eitSections) {
             if (db.holds(key, s.tableId, s.number, s.version)) continue;
             events.clear();
             for (uint16_t id : s.events) {
-                auto e = std::find_if(service.events.begin(), service.events.end(),
-                                      [id](const dvbmodel::Event& x) { return x.id == id; });
-                if (e != service.events.end()) events.push_back(&*e);
+                auto e = byId.find(id);
+                if (e != byId.end()) events.push_back(e->second);
             }
             if (!db.storeSection(key, s.tableId, s.number, s.version, events)) {
                 out.failed = true;
