@@ -1,4 +1,5 @@
 #include "broadcast/DvbSubtitle.h"
+#include "broadcast/Ts.h"
 
 #include <algorithm>
 
@@ -710,19 +711,6 @@ bool same(const ClutEntry& a, const ClutEntry& b) {
 
 }  // namespace
 
-uint64_t readPts(const uint8_t* t) {
-    return uint64_t{(t[0] >> 1) & 7u} << 30 | uint64_t{t[1]} << 22 | (uint64_t{t[2]} >> 1) << 15 |
-           uint64_t{t[3]} << 7 | uint64_t{t[4]} >> 1;
-}
-
-void writePts(uint8_t* p, uint64_t pts) {
-    p[0] = static_cast<uint8_t>(0x21 | ((pts >> 29) & 0x0E));
-    p[1] = static_cast<uint8_t>(pts >> 22);
-    p[2] = static_cast<uint8_t>(pts >> 14 | 1);
-    p[3] = static_cast<uint8_t>(pts >> 7);
-    p[4] = static_cast<uint8_t>(pts << 1 | 1);
-}
-
 std::vector<uint8_t> encodeDisplaySet(const DisplaySet& set, uint16_t pageId, uint64_t pts) {
     std::vector<uint8_t> out = {0x00, 0x00, 0x01, 0xBD, 0, 0, 0x84, 0x80,
                                 5,    0,    0,    0,    0, 0, 0x20, 0x00};
@@ -835,75 +823,6 @@ std::vector<uint8_t> encodeDisplaySet(const DisplaySet& set, uint16_t pageId, ui
     out[4] = static_cast<uint8_t>(length >> 8);
     out[5] = static_cast<uint8_t>(length);
     return out;
-}
-
-// ---- transport packets -------------------------------------------------------------------
-
-void PesAssembler::complete(std::vector<std::vector<uint8_t>>& out) {
-    if (!pes_.empty()) out.push_back(std::move(pes_));
-    pes_.clear();
-}
-
-void PesAssembler::flush(std::vector<std::vector<uint8_t>>& out) {
-    complete(out);
-}
-
-void PesAssembler::feed(const uint8_t* ts, size_t size, std::vector<std::vector<uint8_t>>& out) {
-    for (size_t off = 0; ts != nullptr && off + 188 <= size; off += 188) {
-        const uint8_t* p = ts + off;
-        if (p[0] != 0x47 || ((p[1] & 0x1F) << 8 | p[2]) != pid_) continue;
-        if (p[1] & 0x80) {  // transport error
-            pes_.clear();
-            continuity_ = -1;
-            continue;
-        }
-        int afc = (p[3] >> 4) & 3, cc = p[3] & 15;
-        if (!(afc & 1)) continue;
-        if (cc == continuity_) continue;  // a repeated packet
-        bool lost = continuity_ >= 0 && cc != ((continuity_ + 1) & 15);
-        continuity_ = cc;
-        size_t start = tsPayloadOffset(p);
-        if (start > 188) continue;
-        if (p[1] & 0x40) {
-            complete(out);
-            pes_.assign(p + start, p + 188);
-        } else if (lost) {
-            pes_.clear();
-        } else if (!pes_.empty()) {
-            pes_.insert(pes_.end(), p + start, p + 188);
-        }
-        if (pes_.size() >= 6) {
-            size_t length = size_t{pes_[4]} << 8 | pes_[5];
-            if (length != 0 && pes_.size() >= 6 + length) {
-                pes_.resize(6 + length);
-                complete(out);
-            }
-        }
-    }
-}
-
-void packetizePes(uint16_t pid, const std::vector<uint8_t>& pes, uint8_t& continuity,
-                  std::vector<uint8_t>& ts) {
-    size_t off = 0;
-    do {
-        size_t payload = std::min<size_t>(184, pes.size() - off);
-        ts.insert(ts.end(), {0x47, static_cast<uint8_t>((off == 0 ? 0x40 : 0) | (pid >> 8 & 0x1F)),
-                             static_cast<uint8_t>(pid)});
-        if (payload < 184) {
-            size_t stuffing = 183 - payload;
-            ts.push_back(static_cast<uint8_t>(0x30 | continuity));
-            ts.push_back(static_cast<uint8_t>(stuffing));
-            if (stuffing > 0) {
-                ts.push_back(0x00);
-                ts.insert(ts.end(), stuffing - 1, 0xFF);
-            }
-        } else {
-            ts.push_back(static_cast<uint8_t>(0x10 | continuity));
-        }
-        ts.insert(ts.end(), pes.begin() + off, pes.begin() + off + payload);
-        off += payload;
-        continuity = (continuity + 1) & 15;
-    } while (off < pes.size());
 }
 
 }  // namespace dvbmodel

@@ -101,40 +101,4 @@ private:
 // or the PES over 65535 bytes) gives an empty result.
 std::vector<uint8_t> encodeDisplaySet(const DisplaySet& set, uint16_t pageId, uint64_t pts);
 
-// A PES header's 33-bit time stamp from its 5 bytes (marker bits not checked: a bit error in
-// one leaves the time), and the 5 bytes of `pts` as a PTS-only header writes them ('0010').
-uint64_t readPts(const uint8_t* five);
-void writePts(uint8_t* five, uint64_t pts);
-
-// Where a 188-byte transport packet's payload starts: after its header and, where it has one,
-// its adaptation field (a value over 188 says the field's length byte is broken).
-inline size_t tsPayloadOffset(const uint8_t* packet) {
-    return (packet[3] & 0x20) ? 5 + size_t{packet[4]} : 4;
-}
-
-// The PES packets of one PID, reassembled from 188-byte transport packets. A packet lost on
-// the way (continuity counter) or a transport error drops the PES being assembled.
-class PesAssembler {
-public:
-    explicit PesAssembler(uint16_t pid) : pid_(pid) {}
-
-    // Any number of transport packets (a partial one at the end is ignored); completed PES
-    // packets are appended to `out`.
-    void feed(const uint8_t* ts, size_t size, std::vector<std::vector<uint8_t>>& out);
-    // The PES still being assembled, if any, as it is.
-    void flush(std::vector<std::vector<uint8_t>>& out);
-
-private:
-    void complete(std::vector<std::vector<uint8_t>>& out);
-
-    uint16_t pid_;
-    int continuity_ = -1;
-    std::vector<uint8_t> pes_;
-};
-
-// Appends one PES packet as transport packets of `pid`, the last one padded with adaptation
-// field stuffing; `continuity` is the PID's counter, advanced per packet.
-void packetizePes(uint16_t pid, const std::vector<uint8_t>& pes, uint8_t& continuity,
-                  std::vector<uint8_t>& ts);
-
 }  // namespace dvbmodel

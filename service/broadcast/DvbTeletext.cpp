@@ -1,6 +1,6 @@
 #include "broadcast/DvbTeletext.h"
 
-#include "broadcast/DvbSubtitle.h"
+#include "broadcast/Ts.h"
 
 #include <libzvbi.h>
 

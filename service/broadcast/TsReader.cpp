@@ -51,6 +51,7 @@ extern "C" {
 
 #include "broadcast/DvbTeletext.h"
 #include "broadcast/DvbText.h"
+#include "broadcast/Ts.h"
 
 namespace dvbmodel {
 
@@ -1204,23 +1205,6 @@ bool readTransportStreamFile(const std::string& path, TsCapture& out, std::strin
             readTransportStream(static_cast<const uint8_t*>(map), size, path, out, error, stats);
     munmap(map, size);
     return ok;
-}
-
-uint32_t sectionCrc32(const uint8_t* p, size_t n) {
-    // A byte at a time: every section the reader assembles and the writer completes goes
-    // through here.
-    static constexpr auto kTable = [] {
-        std::array<uint32_t, 256> t{};
-        for (uint32_t b = 0; b < 256; ++b) {
-            uint32_t crc = b << 24;
-            for (int k = 0; k < 8; ++k) crc = crc & 0x80000000 ? crc << 1 ^ 0x04C11DB7 : crc << 1;
-            t[b] = crc;
-        }
-        return t;
-    }();
-    uint32_t crc = 0xFFFFFFFF;
-    for (size_t i = 0; i < n; ++i) crc = crc << 8 ^ kTable[(crc >> 24 ^ p[i]) & 0xFF];
-    return crc;
 }
 
 }  // namespace dvbmodel

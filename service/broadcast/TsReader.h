@@ -63,7 +63,4 @@ bool readTransportStream(const uint8_t* data, size_t size, const std::string& na
 bool readTransportStreamFile(const std::string& path, TsCapture& out, std::string& error,
                              TsReadStats& stats);
 
-// CRC-32/MPEG-2 (ISO/IEC 13818-1 annex A) of `n` bytes: 0 over a whole section that is sound.
-uint32_t sectionCrc32(const uint8_t* p, size_t n);
-
 }  // namespace dvbmodel

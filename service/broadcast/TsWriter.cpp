@@ -1,6 +1,5 @@
 // Writing the broadcast model as a transport stream; see TsWriter.h.
 #include "broadcast/TsWriter.h"
-#include "broadcast/TsReader.h"
 
 // clang-format off
 #include <dvbpsi/dvbpsi.h>
@@ -22,6 +21,7 @@
 #include "broadcast/DvbSubtitle.h"
 
 #include "broadcast/DvbTeletext.h"
+#include "broadcast/Ts.h"
 
 namespace dvbmodel {
 namespace {
@@ -282,9 +282,7 @@ private:
     void time(bool offset, int64_t at);
     void pcr(uint16_t pid, int64_t at);
     void pes(uint16_t pid, uint8_t streamId, uint64_t pts, size_t payload, const Component& c);
-    // One PES packet of `n` bytes as transport packets of `pid`: its first `headLen` bytes from
-    // `head`, the others `fill` but the very last, `last`; the last packet padded with
-    // adaptation field stuffing, as packetizePes does, written in place.
+    // One PES packet as transport packets of `pid`, with the PID's counter (see packetizePes).
     void packetize(uint16_t pid, const uint8_t* head, size_t headLen, size_t n, uint8_t fill = 0,
                    uint8_t last = 0);
     void subtitle(const Service& s, uint32_t index, int64_t at);
@@ -988,30 +986,7 @@ void TsWriter::pes(uint16_t pid, uint8_t streamId, uint64_t pts, size_t payload,
 
 void TsWriter::packetize(uint16_t pid, const uint8_t* head, size_t headLen, size_t n, uint8_t fill,
                          uint8_t last) {
-    uint8_t& cc = st_.continuity_[pid];
-    size_t base = out_.size();
-    out_.resize(base + (n + 183) / 184 * 188);
-    uint8_t* p = out_.data() + base;
-    for (size_t off = 0; off < n; p += 188) {
-        size_t take = std::min<size_t>(184, n - off);
-        p[0] = 0x47;
-        p[1] = static_cast<uint8_t>((off == 0 ? 0x40 : 0) | (pid >> 8 & 0x1F));
-        p[2] = static_cast<uint8_t>(pid);
-        p[3] = static_cast<uint8_t>((take < 184 ? 0x30 : 0x10) | cc);
-        if (take < 184) {
-            size_t stuffing = 183 - take;
-            p[4] = static_cast<uint8_t>(stuffing);
-            if (stuffing > 0) p[5] = 0x00, memset(p + 6, 0xFF, stuffing - 1);
-        }
-        uint8_t* dst = p + 188 - take;
-        size_t fromHead = off < headLen ? std::min(take, headLen - off) : 0;
-        memcpy(dst, head + off, fromHead);
-        memset(dst + fromHead, fill, take - fromHead);
-        cc = (cc + 1) & 15;
-        off += take;
-    }
-    // The payload of the last packet ends the packet: its last byte ends the PES.
-    if (n > headLen) out_.back() = last;
+    packetizePes(pid, head, headLen, n, st_.continuity_[pid], out_, fill, last);
 }
 
 void TsWriter::subtitle(const Service& s, uint32_t index, int64_t at) {

@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "broadcast/DvbSubtitle.h"
+#include "broadcast/Ts.h"
 
 namespace testdata {
 

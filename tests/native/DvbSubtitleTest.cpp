@@ -8,6 +8,7 @@
 #include "Captures.h"
 #include "Ycc.h"
 #include "broadcast/DvbSubtitle.h"
+#include "broadcast/Ts.h"
 
 using namespace dvbmodel;
 using namespace testdata;

@@ -4,8 +4,8 @@
 //  - BM_TeletextFromPes: the decoder alone over the PES packets of the teletext PID;
 //  - BM_TeletextFromTs: the transport stream's packets reassembled into PES, then decoded.
 // The capture comes from ../shared/testdata beside the project; without it nothing runs.
-#include <broadcast/DvbSubtitle.h>
 #include <broadcast/DvbTeletext.h>
+#include <broadcast/Ts.h>
 
 #include <benchmark/benchmark.h>
 

@@ -16,6 +16,7 @@
 // second over the capture's bytes per second of broadcast). The capture comes from
 // ../shared/testdata beside the project; without it nothing runs.
 #include <broadcast/DvbSubtitle.h>
+#include <broadcast/Ts.h>
 #include <broadcast/TsReader.h>
 #include <receiver/Receiver.h>
 
