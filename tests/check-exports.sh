@@ -7,9 +7,8 @@ fail=0
 functions=("JNI_OnLoad" "JNIDVBListener::JNIDVBListener(_JNIEnv*, _jobject*, _jobject*)"
   "JNIDVBListener::~JNIDVBListener()" "JNIDVBListener::notify(int, int, int, android::Parcel const*)"
   "Scnmnotify(int, int, int)" "Strmcallback(void*, int, int)" "Subttlcallback(void*, int, int)"
-  "YCC2RGB_A(unsigned char, unsigned char)")
-for c in Scnm Strm Cfg Subttl Teltxt; do functions+=("register_android_dvb_$c(_JNIEnv*)"); done
-for c in R G B; do functions+=("YCC2RGB_$c(unsigned char, unsigned char, unsigned char)"); done
+  "YCC2RGB_A(unsigned char, unsigned char)" "register_android_dvb_"{Scnm,Strm,Cfg,Subttl,Teltxt}"(_JNIEnv*)"
+  "YCC2RGB_"{R,G,B}"(unsigned char, unsigned char, unsigned char)")
 for f in "${functions[@]}"; do grep -qF -- " T $f" <<<"$symbols" || { echo "missing export: $f"; fail=1; }; done
 for t in s_SvcExt:12400 s_SvcNet:19200 videoContents:64 audioContents:736 subtitleContents:224 \
   teletextContents:672 caSysId:6 EpgExtentItemNow:1536 EpgExtentItemNext:1536 Data:1930792; do
