@@ -7,20 +7,14 @@ fail=0
 functions=("JNI_OnLoad" "JNIDVBListener::JNIDVBListener(_JNIEnv*, _jobject*, _jobject*)"
   "JNIDVBListener::~JNIDVBListener()" "JNIDVBListener::notify(int, int, int, android::Parcel const*)"
   "Scnmnotify(int, int, int)" "Strmcallback(void*, int, int)" "Subttlcallback(void*, int, int)"
-  "YCC2RGB_A(unsigned char, unsigned char)")
-for c in Scnm Strm Cfg Subttl Teltxt; do functions+=("register_android_dvb_$c(_JNIEnv*)"); done
-for c in R G B; do functions+=("YCC2RGB_$c(unsigned char, unsigned char, unsigned char)"); done
-for f in "${functions[@]}"; do
-  grep -qF -- " T $f" <<<"$symbols" || { echo "missing export: $f"; fail=1; }
-done
+  "YCC2RGB_A(unsigned char, unsigned char)" "register_android_dvb_"{Scnm,Strm,Cfg,Subttl,Teltxt}"(_JNIEnv*)"
+  "YCC2RGB_"{R,G,B}"(unsigned char, unsigned char, unsigned char)")
+for f in "${functions[@]}"; do grep -qF -- " T $f" <<<"$symbols" || { echo "missing export: $f"; fail=1; }; done
 for t in s_SvcExt:12400 s_SvcNet:19200 videoContents:64 audioContents:736 subtitleContents:224 \
   teletextContents:672 caSysId:6 EpgExtentItemNow:1536 EpgExtentItemNext:1536 Data:1930792; do
   size=$(awk -v n="${t%:*}" '$4 == n && ($3 == "B" || $3 == "D") {print $2}' <<<"$symbols")
   [ -n "$size" ] && [ $((16#$size)) -eq "${t#*:}" ] || { echo "table ${t%:*}: size '$size', not ${t#*:}"; fail=1; }
 done
-if grep -E " dvbjni::|\(anonymous namespace\)" <<<"$symbols"; then
-  echo "internal symbols are exported (above)"
-  fail=1
-fi
+grep -E " dvbjni::|\(anonymous namespace\)" <<<"$symbols" && { echo "internal symbols are exported (above)"; fail=1; }
 [ $fail -eq 0 ] && echo "exports: ok"
 exit $fail

@@ -10,23 +10,21 @@
 #include <nativehelper/jni.h>
 
 #include <cstring>
-#include <deque>
 #include <memory>
+#include <set>
 #include <string>
+#include <tuple>
 #include <vector>
 
 // A failed check is a finding: name it, then abort so that libFuzzer keeps the input.
-#define FUZZ_CHECK(cond)                                                                    \
-    do {                                                                                    \
-        if (!(cond)) {                                                                      \
-            fprintf(stderr, "fuzz check failed: %s at %s:%d\n", #cond, __FILE__, __LINE__); \
-            __builtin_trap();                                                               \
-        }                                                                                   \
-    } while (0)
+#define FUZZ_CHECK(cond)                                                                       \
+    ((cond) ? void()                                                                           \
+            : (fprintf(stderr, "fuzz check failed: %s at %s:%d\n", #cond, __FILE__, __LINE__), \
+               __builtin_trap()))
 
 namespace fuzz {
 
-enum class Kind { Class, Instance, String, ByteArray, IntArray };
+enum class Kind { Class, Instance, String, ByteArray, IntArray, Any };
 
 struct Object {
     Kind kind;
@@ -38,19 +36,18 @@ struct Object {
 
 struct Field {
     std::string cls, name, signature;
+    auto key() const { return std::tie(cls, name, signature); }
+    bool operator<(const Field& o) const { return key() < o.key(); }
 };
-
-struct Native {
-    std::string cls, name, signature;
+struct Native : Field {
     void* fn;
 };
 
 inline JNIEnv gJni;
-inline JNINativeInterface gTable;
 inline FuzzedDataProvider* gInput;
 inline std::vector<std::unique_ptr<Object>> gObjects;  // of the current call
 inline std::string gThrown;                            // the pending exception's class
-inline std::deque<Field> gFields;     // for the process: their addresses are the field IDs
+inline std::set<Field> gFields;       // for the process: their addresses are the field IDs
 inline std::vector<jint> gContexts;   // what mNativeContext may hold
 inline std::vector<Native> gNatives;  // as the classes registered them
 
@@ -58,12 +55,9 @@ inline std::vector<Native> gNatives;  // as the classes registered them
 inline bool isModifiedUtf8(const std::string& s) {
     for (size_t i = 0; i < s.size();) {
         const auto lead = static_cast<uint8_t>(s[i]);
-        const size_t extra = lead < 0x80                   ? 0
-                             : lead >= 0xC0 && lead < 0xE0 ? 1
-                             : lead >= 0xE0 && lead < 0xF0 ? 2
-                                                           : 3;
+        const size_t extra = "0000000033331123"[lead >> 4] - '0';  // by its top four bits
         if (lead == 0 || extra == 3 || i + extra >= s.size()) return false;
-        uint32_t value = extra == 0 ? lead : lead & (extra == 1 ? 0x1F : 0x0F);
+        uint32_t value = lead & (extra == 0 ? 0x7F : 0x3F >> extra);
         for (size_t k = 1; k <= extra; ++k) {
             if ((s[i + k] & 0xC0) != 0x80) return false;
             value = value << 6 | (s[i + k] & 0x3F);
@@ -85,58 +79,37 @@ inline Object* make(JNIEnv* e, Kind kind, std::string cls = "") {
     return gObjects.emplace_back(new Object{kind, std::move(cls)}).get();
 }
 
-// The object behind a local reference of the current call, if any.
-inline Object* find(const void* ref) {
-    for (const auto& o : gObjects) {
-        if (o.get() == ref) return o.get();
-    }
-    return nullptr;
-}
-
-// The object behind a live local reference of `kind`: anything else is misuse.
+// The object behind a live local reference of the current call, of `kind` (Any: of any kind):
+// anything else is misuse.
 inline Object* live(const void* ref, Kind kind) {
-    Object* o = find(ref);
-    FUZZ_CHECK(o != nullptr && !o->deleted && o->kind == kind);
+    Object* o = nullptr;
+    for (const auto& p : gObjects)
+        if (p.get() == ref) o = p.get();
+    FUZZ_CHECK(o != nullptr && !o->deleted && (kind == Kind::Any || o->kind == kind));
     return o;
 }
 
 // A Java string from the input, any length, any characters (U+0000 and U+0080..U+00FF among
-// them), as the VM hands it out in modified UTF-8.
+// them, in two bytes), as the VM hands it out in modified UTF-8.
 inline jstring javaString() {
     Object* s = make(&gJni, Kind::String);
     const size_t n = gInput->ConsumeIntegralInRange<size_t>(0, 300);
     const std::string pattern = gInput->ConsumeBytesAsString(16) + "x";
     for (size_t i = 0; i < n; ++i) {
-        const auto c = static_cast<uint8_t>(pattern[i % pattern.size()]);
-        if (c != 0 && c < 0x80)
-            s->data += char(c);
-        else
-            s->data += {char(0xC0 | c >> 6), char(0x80 | (c & 0x3F))};
+        auto c = static_cast<uint8_t>(pattern[i % pattern.size()]);
+        if (c == 0 || c >= 0x80) s->data += char(0xC0 | c >> 6), c = 0x80 | (c & 0x3F);
+        s->data += char(c);
     }
     return reinterpret_cast<jstring>(s);
 }
 
-// The field that `id` names, on an object of its class, of signature `sig` ("L": any
-// reference).
+// The field that `id` names, on an object of its class, of signature `sig` ("L": any reference).
 inline const Field& field(JNIEnv* e, jobject instance, jfieldID id, const std::string& sig) {
     enter(e);
     const auto* f = reinterpret_cast<const Field*>(id);
     FUZZ_CHECK(f != nullptr && f->cls == live(instance, Kind::Instance)->cls);
     FUZZ_CHECK(f->signature == sig || (sig == "L" && strchr("L[", f->signature[0]) != nullptr));
     return *f;
-}
-
-inline jint getInt(JNIEnv* e, jobject o, jfieldID id) {
-    if (field(e, o, id, "I").name != "mNativeContext") return gInput->ConsumeIntegral<jint>();
-    // With three contexts: the first six times in eight, each other once.
-    const auto pick = gInput->ConsumeIntegralInRange<size_t>(0, 4 + gContexts.size());
-    return gContexts[pick < 6 ? 0 : pick - 5];
-}
-
-// One in eight strings read is null.
-inline jobject getString(JNIEnv* e, jobject o, jfieldID id) {
-    field(e, o, id, "Ljava/lang/String;");
-    return gInput->ConsumeIntegralInRange(0, 7) == 7 ? nullptr : javaString();
 }
 
 // Every array the library makes is bounded by a record field: anything near this size means
@@ -157,45 +130,42 @@ void setRegion(JNIEnv* e, A array, jsize start, jsize n, const T* from) {
     if (start < 0 || n < 0 || (jlong{start} + n) * sizeof(T) > a->data.size()) {
         FUZZ_CHECK(a->fromJava);
         gThrown = "java/lang/ArrayIndexOutOfBoundsException";
-        return;
+    } else if (n != 0) {
+        memcpy(&a->data[start * sizeof(T)], from, n * sizeof(T));
     }
-    if (n != 0) memcpy(&a->data[start * sizeof(T)], from, n * sizeof(T));
-}
-
-inline jfieldID fieldId(JNIEnv* e, jclass cls, const char* name, const char* sig) {
-    enter(e);
-    const Field f{live(cls, Kind::Class)->cls, name, sig};
-    for (const Field& g : gFields) {
-        if (g.cls == f.cls && g.name == f.name && g.signature == f.signature) {
-            return reinterpret_cast<jfieldID>(const_cast<Field*>(&g));
-        }
-    }
-    return reinterpret_cast<jfieldID>(&gFields.emplace_back(f));
 }
 
 inline JNIEnv* jni() {
-    if (gJni.functions != nullptr) return &gJni;
     __android_log_set_logger([](const struct __android_logger_data*, const char*) {});
-    JNINativeInterface& t = gTable;
+    static JNINativeInterface t;
     t.FindClass = [](JNIEnv* e, const char* name) { return jclass(make(e, Kind::Class, name)); };
     t.ThrowNew = [](JNIEnv* e, jclass cls, const char*) {
         enter(e);  // never over a pending exception
-        gThrown = live(cls, Kind::Class)->cls;
-        return JNI_OK;
+        return gThrown = live(cls, Kind::Class)->cls, JNI_OK;
     };
     t.ExceptionCheck = [](JNIEnv*) -> jboolean { return !gThrown.empty(); };
     t.ExceptionClear = [](JNIEnv*) { gThrown.clear(); };
     t.DeleteLocalRef = [](JNIEnv*, jobject ref) {
-        Object* o = find(ref);
-        FUZZ_CHECK(o != nullptr ? !o->deleted : ref == nullptr);
-        if (o != nullptr) o->deleted = true;
+        if (ref != nullptr) live(ref, Kind::Any)->deleted = true;
     };
-    t.GetFieldID = fieldId;
-    t.GetIntField = getInt;
+    t.GetFieldID = [](JNIEnv* e, jclass cls, const char* name, const char* sig) {
+        enter(e);
+        return jfieldID(&*gFields.insert({live(cls, Kind::Class)->cls, name, sig}).first);
+    };
+    t.GetIntField = [](JNIEnv* e, jobject o, jfieldID id) {
+        if (field(e, o, id, "I").name != "mNativeContext") return gInput->ConsumeIntegral<jint>();
+        // With three contexts: the first six times in eight, each other once.
+        const auto pick = gInput->ConsumeIntegralInRange<size_t>(0, 4 + gContexts.size());
+        return gContexts[pick < 6 ? 0 : pick - 5];
+    };
     t.GetLongField = [](JNIEnv* e, jobject o, jfieldID id) {
         return field(e, o, id, "J"), gInput->ConsumeIntegral<jlong>();
     };
-    t.GetObjectField = getString;
+    // One in eight strings read is null.
+    t.GetObjectField = [](JNIEnv* e, jobject o, jfieldID id) {
+        field(e, o, id, "Ljava/lang/String;");
+        return gInput->ConsumeIntegralInRange(0, 7) == 7 ? nullptr : jobject(javaString());
+    };
     t.SetIntField = [](JNIEnv* e, jobject o, jfieldID id, jint) { field(e, o, id, "I"); };
     t.SetLongField = [](JNIEnv* e, jobject o, jfieldID id, jlong) { field(e, o, id, "J"); };
     t.SetObjectField = [](JNIEnv* e, jobject o, jfieldID id, jobject v) {
@@ -213,9 +183,8 @@ inline JNIEnv* jni() {
     };
     // AddressSanitizer bounds the walk to the zero byte.
     t.NewStringUTF = [](JNIEnv* e, const char* utf) {
-        Object* s = make(e, Kind::String, "");
-        s->data = utf;
-        FUZZ_CHECK(isModifiedUtf8(s->data));
+        Object* s = make(e, Kind::String);
+        FUZZ_CHECK(isModifiedUtf8(s->data = utf));
         return jstring(s);
     };
     t.GetStringUTFChars = [](JNIEnv* e, jstring s, jboolean*) {
@@ -231,13 +200,12 @@ inline JNIEnv* jni() {
     t.SetIntArrayRegion = setRegion<jintArray, jint>;
     t.RegisterNatives = [](JNIEnv* e, jclass cls, const JNINativeMethod* m, jint n) {
         enter(e);
-        for (jint i = 0; i < n; ++i) {
-            gNatives.push_back(
-                    {live(cls, Kind::Class)->cls, m[i].name, m[i].signature, m[i].fnPtr});
-        }
+        const std::string c = live(cls, Kind::Class)->cls;
+        for (jint i = 0; i < n; ++i)
+            gNatives.push_back({{c, m[i].name, m[i].signature}, m[i].fnPtr});
         return JNI_OK;
     };
-    gJni.functions = &gTable;
+    gJni.functions = &t;
     return &gJni;
 }
 

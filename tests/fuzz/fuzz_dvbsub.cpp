@@ -22,9 +22,8 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
         DvbSubtitleDecoder(3, 4).feed(pes.data(), pes.size(), back);
         FUZZ_CHECK(pes.empty() ||
                    (back.size() == 1 && back[0].regions.size() == set.regions.size()));
-        for (size_t i = 0; !pes.empty() && i < set.regions.size(); ++i) {
+        for (size_t i = 0; !pes.empty() && i < set.regions.size(); ++i)
             FUZZ_CHECK(back[0].regions[i].pixels == set.regions[i].pixels);
-        }
     }
     return 0;
 }

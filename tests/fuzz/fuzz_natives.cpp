@@ -20,15 +20,15 @@ namespace {
 std::vector<size_t> gNext;
 
 template <typename Node>
-void relink(Node* head) {
-    for (size_t i = 0; head != nullptr && i < gNext.size(); ++i) {
-        dvbListLink(&head[i], gNext[i] < gNext.size() ? &head[gNext[i]] : nullptr);
-    }
+int32_t relink(Node** head, int32_t result) {
+    for (size_t i = 0; *head != nullptr && i < gNext.size(); ++i)
+        dvbListLink(&(*head)[i], gNext[i] < gNext.size() ? &(*head)[gNext[i]] : nullptr);
+    return result;
 }
 
 // The spy's scan module, with lists relinked as the input says: the spy itself links in order.
-class LinkedScnm : public android::Scnm {
-public:
+struct LinkedScnm : android::Scnm {
+    sp<android::Scnm> s;
     explicit LinkedScnm(sp<android::Scnm> spy) : s(std::move(spy)) {}
     int32_t Reserved1() override { return s->Reserved1(); }
     int32_t Init() override { return s->Init(); }
@@ -38,20 +38,15 @@ public:
     int32_t Stop(int32_t h) override { return s->Stop(h); }
     int32_t GetStatus(int32_t h, SCNM_GetStatus* o) override { return s->GetStatus(h, o); }
     int32_t CreateServiceList(int32_t h, SCNM_ServiceInfo** head) override {
-        const int32_t r = s->CreateServiceList(h, head);
-        return relink(*head), r;
+        return relink(head, s->CreateServiceList(h, head));
     }
     int32_t Reserved9() override { return s->Reserved9(); }
     int32_t CreateNetworkList(int32_t h, SCNMNET_FrontEndSettings** head) override {
-        const int32_t r = s->CreateNetworkList(h, head);
-        return relink(*head), r;
+        return relink(head, s->CreateNetworkList(h, head));
     }
     int32_t Reserved11() override { return s->Reserved11(); }
     int32_t Dvb_SystemInit(const DVB_Config* c) override { return s->Dvb_SystemInit(c); }
     int32_t Dvb_SystemUnInit(const DVB_Config* c) override { return s->Dvb_SystemUnInit(c); }
-
-private:
-    sp<android::Scnm> s;
 };
 
 // Up to three caches' worth of nodes, each the input's pattern stamped with its number; node i
@@ -74,7 +69,7 @@ void plantList(FuzzedDataProvider& in, const char* op) {
 }
 
 // The operations each native reached when called with zeros, with their argument counts, by
-// its place in gNatives.
+// its place in gNatives: none while they are learnt.
 std::vector<std::vector<std::pair<std::string, int>>> gOps;
 
 jlong argument(FuzzedDataProvider& in, const std::string& sig, size_t& i) {
@@ -87,8 +82,7 @@ jlong argument(FuzzedDataProvider& in, const std::string& sig, size_t& i) {
     }
     if (sig[i] == 'Z') return mode;
     const size_t end = sig[i] == '[' ? i + 1 : sig.find(';', i);
-    const std::string cls =
-            sig[i] == '[' ? "B" : sig.substr(i + 1, end - i - 1);  // [B: the one array
+    const std::string cls = sig[i] == '[' ? "B" : sig.substr(i + 1, end - i - 1);  // [B only
     i = end;
     if (mode == 3 && in.ConsumeBool()) return 0;
     if (cls == "B") {
@@ -111,32 +105,29 @@ __attribute__((no_sanitize("function"))) void callOne(FuzzedDataProvider& in, si
     const fuzz::Native& n = fuzz::gNatives[which];
     dvbspy::reset();
     fuzz::reset(&in);
-    if (!gOps.empty()) {
-        for (const auto& [op, argc] : gOps[which]) {
-            if (in.ConsumeBool()) dvbspy::setResult(op, in.ConsumeIntegral<int32_t>());
-            for (int k = argc == 0 ? 0 : in.ConsumeIntegralInRange(0, 4); k > 0; --k) {
-                // Into any argument (the spy drops a value's), in the first KiB or anywhere
-                // in 2 MiB, on an int's boundary as counts and sizes lie. Up to 8 bytes,
-                // then one of them repeated: long text is cheap.
-                const int arg = in.ConsumeIntegralInRange(0, argc - 1);
-                const size_t room = in.ConsumeBool() ? 1024 : 2 << 20;
-                const size_t offset = in.ConsumeIntegral<uint32_t>() % room & ~size_t{3};
-                const size_t length = in.ConsumeIntegralInRange<size_t>(1, 512);
-                std::vector<uint8_t> bytes = in.ConsumeBytes<uint8_t>(8);
-                bytes.resize(length, bytes.empty() ? 0 : bytes[length % bytes.size()]);
-                dvbspy::setOut(op, arg, offset, bytes);
-            }
-        }
-        if (n.name == "Scnm_CreateServiceList") {
-            plantList<SCNM_ServiceInfo>(in, "Scnm::CreateServiceList");
-        } else if (n.name == "Scnm_CreateNetworkList") {
-            plantList<SCNMNET_FrontEndSettings>(in, "Scnm::CreateNetworkList");
+    for (const auto& [op, argc] : gOps[which]) {
+        if (in.ConsumeBool()) dvbspy::setResult(op, in.ConsumeIntegral<int32_t>());
+        for (int k = argc == 0 ? 0 : in.ConsumeIntegralInRange(0, 4); k > 0; --k) {
+            // Into any argument (the spy drops a value's), in the first KiB or anywhere in 2 MiB,
+            // on an int's boundary as counts and sizes lie. Up to 8 bytes, then one of them
+            // repeated: long text is cheap.
+            const int arg = in.ConsumeIntegralInRange(0, argc - 1);
+            const size_t room = in.ConsumeBool() ? 1024 : 2 << 20;
+            const size_t offset = in.ConsumeIntegral<uint32_t>() % room & ~size_t{3};
+            const size_t length = in.ConsumeIntegralInRange<size_t>(1, 512);
+            std::vector<uint8_t> bytes = in.ConsumeBytes<uint8_t>(8);
+            bytes.resize(length, bytes.empty() ? 0 : bytes[length % bytes.size()]);
+            dvbspy::setOut(op, arg, offset, bytes);
         }
     }
+    // While the operations are learnt the input is empty, and so is the list planted.
+    if (n.name == "Scnm_CreateServiceList")
+        plantList<SCNM_ServiceInfo>(in, "Scnm::CreateServiceList");
+    else if (n.name == "Scnm_CreateNetworkList")
+        plantList<SCNMNET_FrontEndSettings>(in, "Scnm::CreateNetworkList");
     jlong args[6] = {};
-    for (size_t i = 1, k = 0; n.signature[i] != ')'; ++i, ++k) {
+    for (size_t i = 1, k = 0; n.signature[i] != ')'; ++i, ++k)
         args[k] = argument(in, n.signature, i);
-    }
     // Teltxt_GetData stages `count` bytes before it looks at the array: a count of gigabytes
     // only costs time and memory.
     if (n.name == "Teltxt_GetData") args[2] = jint(args[2]) % 65536;
@@ -150,9 +141,8 @@ __attribute__((no_sanitize("function"))) void callOne(FuzzedDataProvider& in, si
 bool setUp() {
     JNIEnv* env = fuzz::jni();
     for (auto reg : {register_android_dvb_Scnm, register_android_dvb_Strm, register_android_dvb_Cfg,
-                     register_android_dvb_Subttl, register_android_dvb_Teltxt}) {
+                     register_android_dvb_Subttl, register_android_dvb_Teltxt})
         FUZZ_CHECK(reg(env) == 0 && fuzz::gThrown.empty());
-    }
     fuzz::gNatives.erase(std::remove_if(fuzz::gNatives.begin(), fuzz::gNatives.end(),
                                         [](auto& n) { return n.name == "Dvb_SystemInit"; }),
                          fuzz::gNatives.end());
@@ -166,17 +156,15 @@ bool setUp() {
         fuzz::gContexts.push_back(dvbjni::contextBind(dvb.get()));
     }
     fuzz::gContexts.push_back(0);
-    std::vector<std::vector<std::pair<std::string, int>>> ops;
-    for (size_t i = 0; i < fuzz::gNatives.size(); ++i) {
+    gOps.resize(fuzz::gNatives.size());
+    for (size_t i = 0; i < gOps.size(); ++i) {
         FuzzedDataProvider zeros(nullptr, 0);
         callOne(zeros, i);
-        ops.emplace_back();
         for (const dvbspy::Call& c : dvbspy::calls()) {
             const std::pair<std::string, int> op{c.op, int(c.args.size())};
-            if (std::count(ops.back().begin(), ops.back().end(), op) == 0) ops.back().push_back(op);
+            if (std::count(gOps[i].begin(), gOps[i].end(), op) == 0) gOps[i].push_back(op);
         }
     }
-    gOps = std::move(ops);
     return true;
 }
 
@@ -189,11 +177,9 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     const auto& natives = fuzz::gNatives;
     const std::string cls = natives[in.ConsumeIntegralInRange<size_t>(0, natives.size() - 1)].cls;
     std::vector<size_t> own;
-    for (size_t i = 0; i < natives.size(); ++i) {
+    for (size_t i = 0; i < natives.size(); ++i)
         if (natives[i].cls == cls) own.push_back(i);
-    }
-    for (int calls = in.ConsumeIntegralInRange(1, 8); ready && calls > 0; --calls) {
+    for (int calls = in.ConsumeIntegralInRange(1, 8); ready && calls > 0; --calls)
         callOne(in, own[in.ConsumeIntegralInRange<size_t>(0, own.size() - 1)]);
-    }
     return 0;
 }

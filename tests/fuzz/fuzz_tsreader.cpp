@@ -2,11 +2,6 @@
 // it reads must hold together: no packet counted that the input does not hold, every region's
 // pixels its width times its height, every display set inside the capture's loop, and a
 // rejected input gives an error and no broadcast.
-#include <cstddef>
-#include <cstdint>
-#include <string>
-#include <vector>
-
 #include "Harness.h"
 #include "broadcast/TsReader.h"
 
@@ -24,7 +19,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     FUZZ_CHECK(capture.tuned.size() == capture.networks.size());
     for (size_t n = 0; n < capture.networks.size(); ++n) {
         FUZZ_CHECK(capture.tuned[n].size() == capture.networks[n].transports.size());
-        for (const Transport& t : capture.networks[n].transports) {
+        for (const Transport& t : capture.networks[n].transports)
             for (const Service& s : t.services) {
                 for (const DisplaySet& set : s.subtitles) {
                     FUZZ_CHECK(set.time >= 0 && set.time < capture.durationMs);
@@ -34,7 +29,6 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
                 for (size_t e = 1; e < s.events.size(); ++e)
                     FUZZ_CHECK(s.events[e - 1].start <= s.events[e].start);
             }
-        }
     }
     return 0;
 }
