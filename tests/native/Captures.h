@@ -56,6 +56,13 @@ struct TempDir {
     TempDir() { fs::create_directories(path); }
     ~TempDir() { fs::remove_all(path); }
     std::string operator/(const std::string& name) const { return (path / name).string(); }
+    // A file of the folder holding `bytes` (a string or a byte vector); its path.
+    template <typename Bytes>
+    std::string write(const std::string& name, const Bytes& bytes) const {
+        std::ofstream(path / name, std::ios::binary)
+                .write(reinterpret_cast<const char*>(bytes.data()), bytes.size());
+        return *this / name;
+    }
 };
 
 }  // namespace testdata

@@ -152,9 +152,7 @@ TEST(TsWriter, EveryBuiltinTransportReadsBackToTheSameModelAndInFfprobe) {
             writeTransport(b, n, t, kStart, spanMs, ts, state, options);
             EXPECT_EQ(state.stats().sectionsDropped, 0u);
             if (ffprobe) {
-                std::ofstream(dir / "tp.ts", std::ios::binary)
-                        .write(reinterpret_cast<const char*>(ts.data()), ts.size());
-                EXPECT_EQ(probe(dir / "tp.ts"), expected(t)) << "transport " << t.tsid;
+                EXPECT_EQ(probe(dir.write("tp.ts", ts)), expected(t)) << "transport " << t.tsid;
             }
             TsCapture c;
             TsReadStats stats;
@@ -194,10 +192,10 @@ TEST(TsWriter, EveryBuiltinTransportReadsBackToTheSameModelAndInFfprobe) {
                 }
                 for (const TeletextPage& p : got.teletext) {
                     auto same = [&](const TeletextPage& m) {
-                        return m.time + kTsDecodeDelayMs == p.time && m.number == p.number &&
-                               m.subcode == p.subcode && m.controlBits == p.controlBits &&
-                               m.rows[1] == p.rows[1] && m.rows[23] == p.rows[23] &&
-                               m.links == p.links;
+                        return std::tie(m.number, m.subcode, m.controlBits, m.rows[1], m.rows[23],
+                                        m.links) == std::tie(p.number, p.subcode, p.controlBits,
+                                                             p.rows[1], p.rows[23], p.links) &&
+                               m.time + kTsDecodeDelayMs == p.time;
                     };
                     EXPECT_TRUE(std::any_of(want.teletext.begin(), want.teletext.end(), same))
                             << want.id << " page " << std::hex << p.number;
@@ -281,18 +279,15 @@ TEST(TsRecording, TimeShiftRecordsTheServiceAndADumpTheTransponder) {
     android::sp<dvbrx::ReceiverStrm> strm = new dvbrx::ReceiverStrm(rx);
     android::sp<dvbrx::ReceiverCfg> cfg = new dvbrx::ReceiverCfg(rx);
     const Transport* tp = nullptr;
-    for (const auto& net : rx->broadcast().networks) {
+    for (const auto& net : rx->broadcast().networks)
         for (const auto& t : net.transports) tp = t.tuning.delivery == Delivery::Cable ? &t : tp;
-    }
     const Service& svc = tp->services[0];
     STRM_OpenSettings open{};
     int32_t h = strm->Open(&open);
     STRM_Settings s{};
-    s.fe.type = dvbrx::kCable;
-    s.fe.frequency = static_cast<int32_t>(tp->tuning.frequencyKHz);
-    s.fe.symbolRate = static_cast<int32_t>(tp->tuning.symbolRate);
-    s.fe.modulation = static_cast<int32_t>(tp->tuning.modulation);
-    s.fe.fecInner = 10;
+    const Tuning& tuning = tp->tuning;
+    s.fe.type = dvbrx::kCable, s.fe.frequency = int32_t(tuning.frequencyKHz), s.fe.fecInner = 10;
+    s.fe.symbolRate = int32_t(tuning.symbolRate), s.fe.modulation = int32_t(tuning.modulation);
     s.svcId = svc.id;
     ASSERT_EQ(strm->Start(h, &s), dvbrx::kOk);
     EXPECT_EQ(cfg->TSDumpStart(0, 0, 0, (dir / "missing/dump.ts").c_str()), dvbrx::kErrPath);
@@ -357,25 +352,21 @@ TEST(TsWriter, MpegVideoCarriesATestCardThatFfmpegDecodes) {
     NEED_FFPROBE();
     Broadcast b = builtinBroadcast(kStart / 1000);
     const Network* net = nullptr;
+    const Transport* tp = nullptr;
     const Service* svc = nullptr;
     for (const Network& n : b.networks)
         for (const Transport& t : n.transports)
             for (const Service& s : t.services)
                 if (!svc && !s.components.empty() && s.components[0].streamType == 0x02)
-                    net = &n, svc = &s;
+                    net = &n, tp = &t, svc = &s;
     ASSERT_NE(svc, nullptr);
-    const Transport& tp = *std::find_if(
-            net->transports.begin(), net->transports.end(),
-            [&](auto& t) { return &t.services.front() <= svc && svc <= &t.services.back(); });
     TsWriterOptions options;
     options.only = svc;
     std::vector<uint8_t> ts;
     TsWriterState state;
-    writeTransport(b, *net, tp, kStart, 1000, ts, state, options);
+    writeTransport(b, *net, *tp, kStart, 1000, ts, state, options);
     TempDir dir;
-    std::ofstream(dir / "card.ts", std::ios::binary)
-            .write(reinterpret_cast<const char*>(ts.data()), ts.size());
-    const std::string yuv = run("ffmpeg -v error -i '" + (dir / "card.ts") +
+    const std::string yuv = run("ffmpeg -v error -i '" + dir.write("card.ts", ts) +
                                 "' -map 0:v:0 -frames:v 1 -f rawvideo -pix_fmt yuv420p -");
     const int w = 720, h = 576;
     ASSERT_EQ(yuv.size(), size_t(w * h * 3 / 2));
@@ -384,12 +375,12 @@ TEST(TsWriter, MpegVideoCarriesATestCardThatFfmpegDecodes) {
         return std::array<int, 3>{uint8_t(yuv[size_t(y * w + x)]), uint8_t(yuv[w * h + chroma]),
                                   uint8_t(yuv[w * h * 5 / 4 + chroma])};
     };
-    const std::array<int, 3> bars[] = {{180, 128, 128}, {162, 44, 142}, {131, 156, 44},
-                                       {112, 72, 58},   {84, 184, 198}, {65, 100, 212},
-                                       {35, 212, 114},  {16, 128, 128}};
-    std::vector<std::array<int, 3>> got, want(std::begin(bars), std::end(bars));
+    // The eight bars, then the ramp's ends.
+    const std::vector<std::array<int, 3>> want = {
+            {180, 128, 128}, {162, 44, 142}, {131, 156, 44}, {112, 72, 58},  {84, 184, 198},
+            {65, 100, 212},  {35, 212, 114}, {16, 128, 128}, {16, 128, 128}, {235, 128, 128}};
+    std::vector<std::array<int, 3>> got;
     for (int i = 0; i < 8; ++i) got.push_back(at((2 * i + 1) * w / 16, 40));
-    want.push_back({16, 128, 128}), want.push_back({235, 128, 128});
     got.push_back(at(8, h - 8)), got.push_back(at(w - 8, h - 8));
     for (size_t i = 0; i < want.size(); ++i)
         for (int k = 0; k < 3; ++k) EXPECT_NEAR(got[i][k], want[i][k], 2) << i << ' ' << k;
