@@ -42,9 +42,8 @@ inline Packets pes(const std::string& capture, uint16_t pid) {
 // Bytes written in hex, spaces between them for the eye.
 inline std::string unhex(const std::string& h) {
     std::string b;
-    for (size_t i = 0; i + 1 < h.size(); i += h[i] == ' ' ? 1 : 2) {
+    for (size_t i = 0; i + 1 < h.size(); i += h[i] == ' ' ? 1 : 2)
         if (h[i] != ' ') b += char(std::stoi(h.substr(i, 2), nullptr, 16));
-    }
     return b;
 }
 

@@ -34,13 +34,12 @@ std::vector<uint32_t> compose(const DisplaySet& s) {
             const ClutEntry* table = r.depth == 1   ? clut->c2.data()
                                      : r.depth == 2 ? clut->c4.data()
                                                     : clut->c8.data();
-            for (int y = 0; y < r.height && at.y + y < s.displayHeight; ++y) {
+            for (int y = 0; y < r.height && at.y + y < s.displayHeight; ++y)
                 for (int x = 0; x < r.width && at.x + x < s.displayWidth; ++x) {
                     const ClutEntry& e = table[r.pixels[size_t(y) * r.width + x]];
                     canvas[size_t(at.y + y) * s.displayWidth + at.x + x] =
                             static_cast<uint32_t>(dvbjni::yccToArgb(e.y, e.cr, e.cb, e.t));
                 }
-            }
         }
     }
     return canvas;
@@ -65,9 +64,8 @@ size_t differences(const std::vector<uint32_t>& a, const std::vector<uint32_t>& 
     size_t count = 0;
     for (size_t i = 0; i < a.size(); ++i) {
         bool differs = false;
-        for (int shift = 0; shift < 32; shift += 8) {
+        for (int shift = 0; shift < 32; shift += 8)
             differs |= std::abs(int(a[i] >> shift & 255) - int(b[i] >> shift & 255)) > tolerance;
-        }
         count += differs && (a[i] >> 24 || b[i] >> 24);
     }
     return count;
@@ -223,9 +221,8 @@ TEST(DvbSubtitle, DamagedSegmentsAreDroppedAndCounted) {
     const DisplaySet s = sample();
     const std::vector<uint8_t> good = encodeDisplaySet(s, 3, 0);
     auto bodyOf = [&good](uint8_t type, int nth) {
-        for (size_t i = 16; i + 6 <= good.size(); i += 6 + (good[i + 4] << 8 | good[i + 5])) {
+        for (size_t i = 16; i + 6 <= good.size(); i += 6 + (good[i + 4] << 8 | good[i + 5]))
             if (good[i + 1] == type && nth-- == 0) return i + 6;
-        }
         return size_t{0};
     };
     // The flags of the CLUT segment's last entry: its range bit flipped, the entry runs past
@@ -282,9 +279,8 @@ void section(std::vector<uint8_t>& ts, uint16_t pid, std::vector<uint8_t> s) {
 }
 
 TEST(DvbSubtitle, FfmpegRendersTheEncodedDisplaySet) {
-    if (std::system("ffmpeg -version >/dev/null 2>&1") != 0) {
+    if (std::system("ffmpeg -version >/dev/null 2>&1") != 0)
         GTEST_SKIP() << "ffmpeg is not on PATH (Debian package ffmpeg): no independent decoder";
-    }
     TempDir dir;
     std::vector<uint8_t> ts;
     section(ts, 0, {0x00, 0xB0, 0x0D, 0, 1, 0xC1, 0, 0, 0, 1, 0xE1, 0x00, 0xE8, 0xF9, 0x5E, 0x7D});
@@ -298,8 +294,7 @@ TEST(DvbSubtitle, FfmpegRendersTheEncodedDisplaySet) {
     uint8_t cc = 0;
     packetizePes(0x101, encodeDisplaySet(s, 3, 90000), cc, ts);
     packetizePes(0x101, encodeDisplaySet(clear, 3, 180000), cc, ts);
-    std::ofstream(dir / "sub.ts", std::ios::binary)
-            .write(reinterpret_cast<const char*>(ts.data()), ts.size());
+    dir.write("sub.ts", ts);
     std::string command = "cd " + dir.path.string() +
                           " && ffmpeg -nostdin -loglevel error -y -i sub.ts -filter_complex "
                           "'[0:0]showinfo[s]' -map '[s]' -fps_mode passthrough f%03d.png";

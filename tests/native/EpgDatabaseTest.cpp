@@ -91,9 +91,8 @@ TEST_F(EpgDatabaseTest, ANewVersionReplacesOnlyItsOwnSectionAndAllSurvivesAResta
     for (const Step& s : steps) {
         if (&s == &steps[7]) db = open();
         std::vector<Event> events;
-        for (size_t i = 0; i < s.events.size(); ++i) {
+        for (size_t i = 0; i < s.events.size(); ++i)
             events.push_back(event(s.events[i], s.events[i] * 1000 + int64_t(i), 60, i * 999));
-        }
         ASSERT_TRUE(db->storeSection(s.service, s.table, s.section, s.version, events))
                 << db->lastError();
         EXPECT_EQ(ids(all(*db)), s.expected)
@@ -173,9 +172,8 @@ TEST_F(EpgDatabaseTest, RefusesWhatItCannotOpenWithTheReason) {
         std::filesystem::remove(path_);
         if (!content.empty()) std::ofstream(path_, std::ios::binary) << content;
         sqlite3* raw = nullptr;
-        if (!statement.empty() && sqlite3_open(path_.c_str(), &raw) == SQLITE_OK) {
+        if (!statement.empty() && sqlite3_open(path_.c_str(), &raw) == SQLITE_OK)
             sqlite3_exec(raw, statement.c_str(), nullptr, nullptr, nullptr);
-        }
         sqlite3_close(raw);
         auto bytes = [&] {
             std::ifstream in(path_, std::ios::binary);

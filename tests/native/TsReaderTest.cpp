@@ -35,10 +35,9 @@ Loaded load(const std::string& setting) {
     Loaded l;
     std::string error;
     EXPECT_TRUE(loadBroadcast(setting, 0, l.b, error, &l.stats)) << error;
-    for (const Network& n : l.b.networks) {
+    for (const Network& n : l.b.networks)
         for (const Transport& t : n.transports)
             for (const Service& s : t.services) l.services[{t.onid, t.tsid, s.id}] = &s;
-    }
     return l;
 }
 
@@ -194,20 +193,16 @@ TEST(TsReader, DamagedCaptureKeepsWhatIsSoundAndCountsTheRest) {
 
 TEST(TsReader, SettingErrorsNameTheFileAndLine) {
     TempDir dir;
-    auto write = [&](const std::string& name, const std::string& text) {
-        std::ofstream(dir / name) << text;
-        return dir / name;
-    };
-    const std::string notTs = write("notes.ts", "Good grief, this is text\n");
+    const std::string notTs = dir.write("notes.ts", std::string("Good grief, this is text\n"));
     const std::string absent = dir / "absent.ts", x = dir / "x.ts", empty = dir / "empty";
     std::filesystem::create_directory(empty);
     std::vector<std::pair<std::string, std::string>> cases = {
             {notTs, notTs + ": not an MPEG transport stream"},
             {absent, absent + ": no such file or folder"},
             {empty, empty + ": folder holds no .ts capture"},
-            {write("x.broadcast", "x.ts   # a capture\n"), x + ": cannot read"},
+            {dir.write("x.broadcast", std::string("x.ts   # a capture\n")), x + ": cannot read"},
     };
-    const std::pair<const char*, const char*> files[] = {
+    const std::pair<std::string, const char*> files[] = {
             {"# nothing\n\n", ": lists no capture"},
             {"# c\nx.ts satellite 11494000 22000000\n", ":2: satellite needs a symbol rate"},
             {"x.ts terrestrial 586000 8000\ny.ts cable\n", ":2: 'cable' needs a frequency"},
@@ -220,7 +215,7 @@ TEST(TsReader, SettingErrorsNameTheFileAndLine) {
             {"x.ts terrestrial 586000 8000 9\n", ":1: too many fields"},
     };
     for (const auto& [text, error] : files) {
-        const std::string path = write(std::to_string(cases.size()) + ".broadcast", text);
+        const std::string path = dir.write(std::to_string(cases.size()) + ".broadcast", text);
         cases.push_back({path, path + error});
     }
     for (const auto& [setting, want] : cases) {
@@ -260,9 +255,8 @@ TEST(TsReader, BroadcastFileTunesItsCaptureAndTheRuleTheRest) {
     NEED_CAPTURE("fr-dvbt-multiplex-si.ts");
     TempDir dir;
     const std::string rel = fs::relative(kDir + "/fr-dvbt-multiplex-si.ts", dir.path);
-    std::ofstream(dir / "fr.broadcast") << "# the French multiplex R4\n"
-                                        << rel << "  terrestrial 482000 7000\n";
-    const Loaded l = load(dir / "fr.broadcast");
+    const Loaded l = load(dir.write(
+            "fr.broadcast", "# the French multiplex R4\n" + rel + "  terrestrial 482000 7000\n"));
     // The capture's own transport (tsid 4) takes the file's tuning; the rule skips 482000.
     std::map<int, std::pair<uint32_t, uint32_t>> got,  // tsid: kHz, bandwidth
             want = {{1, {474000, 8000}},  {2, {490000, 8000}},  {3, {498000, 8000}},
