@@ -6,9 +6,9 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <filesystem>
-#include <fstream>
 #include <sstream>
+
+#include "Captures.h"
 
 namespace {
 
@@ -49,13 +49,6 @@ std::vector<int> ids(const std::vector<Event>& events) {
 
 class EpgDatabaseTest : public testing::Test {
 protected:
-    void SetUp() override {
-        dir_ = testing::TempDir() + "epgdb-XXXXXX";
-        ASSERT_NE(mkdtemp(dir_.data()), nullptr);
-        path_ = dir_ + "/epg.db";
-    }
-    void TearDown() override { std::filesystem::remove_all(dir_); }
-
     std::unique_ptr<EpgDatabase> open() {
         std::string error;
         auto db = EpgDatabase::open(path_, &error);
@@ -66,7 +59,8 @@ protected:
         return db.events(key, INT64_MIN, INT64_MAX);
     }
 
-    std::string dir_, path_;
+    testdata::TempDir dir_;
+    const std::string path_ = dir_ / "epg.db";
 };
 
 TEST_F(EpgDatabaseTest, ANewVersionReplacesOnlyItsOwnSectionAndAllSurvivesARestart) {
@@ -163,7 +157,7 @@ TEST_F(EpgDatabaseTest, AStoreKilledMidwayLeavesTheLastCommittedEvents) {
 TEST_F(EpgDatabaseTest, RefusesWhatItCannotOpenWithTheReason) {
     // Path, what the file holds (bytes, or what SQL made), the reason.
     const std::string cases[][4] = {
-            {dir_ + "/missing/epg.db", "", "", "unable to open database file"},
+            {dir_ / "missing/epg.db", "", "", "unable to open database file"},
             {path_, std::string(8192, 'Z'), "", "file is not a database"},
             {path_, "", "CREATE TABLE t (x)", "not an event database (it holds other tables)"},
             {path_, "", "PRAGMA user_version = 7", "not an event database (schema version 7)"},

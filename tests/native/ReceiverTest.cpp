@@ -5,12 +5,12 @@
 #include <receiver/Modules.h>
 #include <receiver/SubtitleData.h>
 #include <receiver/Teletext.h>
+#include "Captures.h"
 
 #include <algorithm>
 #include <cmath>
 #include <cstdlib>
 #include <cstring>
-#include <filesystem>
 #include <fstream>
 #include <mutex>
 #include <set>
@@ -99,10 +99,7 @@ protected:
 class ReceiverTest : public Harness {
 protected:
     ReceiverTest() { start(fallbackBroadcast(kStart / 1000)); }
-    ~ReceiverTest() override {
-        rx.reset();
-        std::filesystem::remove_all(dir);
-    }
+    ~ReceiverTest() override { rx.reset(); }  // the database closed before its folder goes
 
     int32_t systemInit(const std::string& path) {
         setenv("DVB_EPG_DB", path.c_str(), 1);
@@ -128,11 +125,7 @@ protected:
         return st;
     }
 
-    // A folder of the test's own: other test processes, of other builds too, run meanwhile.
-    std::string dir = [] {
-        std::string d = ::testing::TempDir() + "receiver-XXXXXX";
-        return mkdtemp(d.data()) != nullptr ? d : "/nonexistent";
-    }();
+    testdata::TempDir dir;
 };
 
 TEST_F(ReceiverTest, TuneLocksOnlyWhereTheModelHasATransponder) {
@@ -427,7 +420,7 @@ TEST_F(ReceiverTest, BadInputGetsItsResult) {
 const EpgSvc kKanal{0x2801, 1011, 1, {}, 0, 0, 0}, kGunes{0x3101, 12400, 318, {}, 0, 0, 0};
 
 TEST_F(ReceiverTest, TheDatabaseOpensOrSaysWhyNotAndCollectedServicesFillItOnceForGood) {
-    const std::string path = dir + "/epg.db", text = dir + "/text";
+    const std::string path = dir / "epg.db", text = dir / "text";
     std::ofstream(text) << "not a database\n";
     start(dvbmodel::builtinBroadcast(kStart / 1000));
     STRM_OpenSettings open{};
@@ -444,8 +437,8 @@ TEST_F(ReceiverTest, TheDatabaseOpensOrSaysWhyNotAndCollectedServicesFillItOnceF
         std::string path;
         int32_t result;
         Events ready;
-    } inits[] = {{dir + "/missing/epg.db", kErrPath, {}},
-                 {dir, kOk, {{kEvtSystemReady, kErrDatabase, 0}}},
+    } inits[] = {{dir / "missing/epg.db", kErrPath, {}},
+                 {dir.path, kOk, {{kEvtSystemReady, kErrDatabase, 0}}},
                  {text, kOk, {{kEvtSystemReady, kErrDatabase, 0}}},
                  {path, kOk, {{kEvtSystemReady, 0, 0}}}};
     for (const auto& c : inits) {
