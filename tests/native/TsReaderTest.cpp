@@ -68,8 +68,7 @@ TEST(TsReader, FrenchMultiplexMatchesItsTruth) {
     // NIT: the network, its transports in order, their LCNs; every centre frequency is
     // 0xFFFFFFFF, so the frequency rule tunes them (its test below).
     const json& nit = t["nit"][0];
-    ASSERT_FALSE(l.b.networks.empty());
-    const Network& net = l.b.networks[0];
+    const Network& net = l.b.networks.at(0);
     EXPECT_EQ(net.id, nit["network_id"]);
     EXPECT_EQ(net.name, unhex(nit["network_name"]["hex"]));
     ASSERT_GE(net.transports.size(), nit["transport_streams"].size());
@@ -102,20 +101,17 @@ TEST(TsReader, FrenchMultiplexMatchesItsTruth) {
         EXPECT_EQ(decodeText(got->text), text) << e["event_id"];
         EXPECT_EQ(decodeText(got->extendedText), ext.empty() ? "" : ext.begin().value());
     };
-    for (const auto& [name, svc] : t["eit_pf"]["services"].items()) {
-        for (const char* part : {"present", "following"}) {
+    for (const auto& [name, svc] : t["eit_pf"]["services"].items())
+        for (const char* part : {"present", "following"})
             for (const json& e : svc.value(part, json::object()).value("events", json::array())) {
                 const json& se = e["short_events"][0];
                 check(svc, e, e["duration"]["seconds"], se["name"]["hex"], se["text"]["utf8"],
                       e.value("extended_text_concatenated", json::object()));
             }
-        }
-    }
     for (const auto& [name, svc] : t["eit_schedule"]["services"].items()) {
-        for (const json& e : svc["events"]) {
+        for (const json& e : svc["events"])
             check(svc, e, utc("1970-01-01T" + e["duration"].get<std::string>() + "Z"),
                   e["name_hex"], e["text_utf8"], e["extended_text_utf8"]);
-        }
         // The schedule's sections as received, each with the events it listed.
         std::set<std::pair<int, int>> want, got;
         for (const auto& [table, numbers] : svc["sections_seen"].items())

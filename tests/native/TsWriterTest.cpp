@@ -125,14 +125,6 @@ std::string describe(const DisplaySet& ds) {
     return d;
 }
 
-const Transport* find(const std::vector<Network>& networks, uint16_t onid, uint16_t tsid,
-                      const Network** network = nullptr) {
-    for (const Network& n : networks)
-        for (const Transport& t : n.transports)
-            if (t.onid == onid && t.tsid == tsid) return network && (*network = &n), &t;
-    return nullptr;
-}
-
 // Every transport of the built-in broadcast, written and read back by our reader: the same
 // model, field by field, with what a transport stream does not carry named where the
 // comparison leaves it out; and read by ffprobe, an independent reader, as the model says.
@@ -164,7 +156,10 @@ TEST(TsWriter, EveryBuiltinTransportReadsBackToTheSameModelAndInFfprobe) {
                       0u)
                     << formatTsReadStats(stats);
             const Network* rn = nullptr;
-            const Transport* rt = find(c.networks, t.onid, t.tsid, &rn);
+            const Transport* rt = nullptr;
+            for (const Network& m : c.networks)
+                for (const Transport& u : m.transports)
+                    if (u.onid == t.onid && u.tsid == t.tsid) rn = &m, rt = &u;
             ASSERT_NE(rt, nullptr) << t.tsid;
             EXPECT_EQ(std::tie(rn->id, rn->name, rn->delivery), std::tie(n.id, n.name, n.delivery));
             const Tuning &a = rt->tuning, &w = t.tuning;
