@@ -230,32 +230,29 @@ TEST(DvbSubtitle, DamagedSegmentsAreDroppedAndCounted) {
     const size_t clut = bodyOf(0x12, 0), clutEnd = clut + (good[clut - 2] << 8 | good[clut - 1]);
     size_t lastFlags = clut + 3;
     for (size_t i = clut + 2; i + 1 < clutEnd; i += (good[i + 1] & 1) ? 6 : 4) lastFlags = i + 1;
-    // What: the byte at `at` set to `value`, `keep` bytes kept; the count that tells; whether
-    // the 4-bit region's pixels survive.
+    // What: the byte at `at` set to `value`; the count that tells; whether the 4-bit region's
+    // pixels survive; the bytes kept.
+    using St = DvbSubtitleStats;
     const struct {
         const char* what;
-        size_t at, value, keep;
-        uint32_t DvbSubtitleStats::*counter;
+        size_t at, value;
+        uint32_t St::*counter;
         bool regionTwoDrawn;
+        size_t keep = SIZE_MAX;
     } cases[] = {
-            {"CLUT typed as object data", bodyOf(0x12, 0) - 5, 0x13, good.size(),
-             &DvbSubtitleStats::missingCluts, true},
-            {"object field longer than its segment", bodyOf(0x13, 1) + 3, 0xFF, good.size(),
-             &DvbSubtitleStats::objectsDropped, false},
-            {"object of a reserved coding method", bodyOf(0x13, 1) + 2, 0x0C, good.size(),
-             &DvbSubtitleStats::objectsDropped, false},
-            {"CLUT entry running past its segment", lastFlags, good[lastFlags] ^ 1u, good.size(),
-             &DvbSubtitleStats::segmentsDropped, true},
-            {"object placed past the region's edge", bodyOf(0x11, 1) + 12, 0x02, good.size(),
-             &DvbSubtitleStats::runsClipped, false},
-            {"last object without sync, cut short", bodyOf(0x13, 2) - 6, 0x0E, bodyOf(0x13, 2) + 40,
-             &DvbSubtitleStats::segmentsDropped, true},
+            {"CLUT typed as object data", bodyOf(0x12, 0) - 5, 0x13, &St::missingCluts, true},
+            {"object field past its end", bodyOf(0x13, 1) + 3, 0xFF, &St::objectsDropped, false},
+            {"object of a reserved coding", bodyOf(0x13, 1) + 2, 0x0C, &St::objectsDropped, false},
+            {"CLUT entry overruns", lastFlags, good[lastFlags] ^ 1u, &St::segmentsDropped, true},
+            {"object past the region's edge", bodyOf(0x11, 1) + 12, 0x02, &St::runsClipped, false},
+            {"last object without sync, cut short", bodyOf(0x13, 2) - 6, 0x0E, &St::segmentsDropped,
+             true, bodyOf(0x13, 2) + 40},
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.what);
         std::vector<uint8_t> pes = good;
         pes[c.at] = static_cast<uint8_t>(c.value);
-        pes.resize(c.keep);
+        pes.resize(std::min(c.keep, pes.size()));
         DvbSubtitleDecoder decoder(3, 4);
         std::vector<DisplaySet> out = decode(decoder, {pes});
         // A display set that lost its end comes out when the next page composition arrives.

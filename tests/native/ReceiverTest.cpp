@@ -524,8 +524,7 @@ protected:
         EXPECT_EQ(strm->Start(stream, &s), kOk);
         advance(1000);
         SUBTTL_Settings sub{};
-        sub.pid = 0x105, sub.compositionPageId = sub.ancillaryPageId = 1;
-        sub.hstrm = static_cast<uint32_t>(stream);
+        sub.pid = 0x105, sub.compositionPageId = sub.ancillaryPageId = 1, sub.hstrm = stream;
         subHandle = subttl->Start(&sub);
         TELTXT_Settings txt{};
         txt.pid = 0x106;
