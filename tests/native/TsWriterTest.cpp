@@ -135,7 +135,7 @@ TEST(TsWriter, EveryBuiltinTransportReadsBackToTheSameModelAndInFfprobe) {
     Broadcast b = builtinBroadcast(kStart / 1000);
     const int64_t midnight = kStart / 1000 / 86400 * 86400;
     size_t subtitles = 0, pages = 0;
-    for (const Network& n : b.networks) {
+    for (const Network& n : b.networks)
         for (const Transport& t : n.transports) {
             std::vector<uint8_t> ts;
             TsWriterState state;
@@ -198,7 +198,6 @@ TEST(TsWriter, EveryBuiltinTransportReadsBackToTheSameModelAndInFfprobe) {
                 }
             }
         }
-    }
     EXPECT_GT(subtitles, 0u);
     EXPECT_GT(pages, 0u);
     if (!ffprobe)
