@@ -129,11 +129,7 @@ protected:
 };
 
 TEST_F(ReceiverTest, TuneLocksOnlyWhereTheModelHasATransponder) {
-    const struct {
-        const char* what;
-        ANT_FrontendParameters p;
-        int32_t result;
-    } cases[] = {
+    const std::tuple<const char*, P, int32_t> cases[] = {
             {"satellite", sat(11493750, 0), kOk},
             {"1.25 MHz off", sat(11495000, 0), kOk},
             {"3.25 MHz off", sat(11497000, 0), kErrNoSignal},
@@ -161,7 +157,7 @@ TEST_F(ReceiverTest, TuneLocksOnlyWhereTheModelHasATransponder) {
             {"frequency out of band", sat(100, 0), kErrBadParameter},
             {"negative frequency", terrestrial(-586000), kErrBadParameter},
     };
-    for (const auto& c : cases) EXPECT_EQ(cfg->TryTune(0, &c.p), c.result) << c.what;
+    for (const auto& [what, p, result] : cases) EXPECT_EQ(cfg->TryTune(0, &p), result) << what;
     ANT_FrontendParameters p = cable(346000);  // a front end of none, or no parameters
     EXPECT_EQ(std::vector<int32_t>({cfg->TryTune(2, &p), cfg->Tune(-1, &p), cfg->Tune(0, nullptr)}),
               std::vector<int32_t>(3, kErrBadParameter));
@@ -207,13 +203,7 @@ TEST_F(ReceiverTest, PositionerMovesAtMotorSpeedWithinItsLimits) {
     int64_t travel = std::llround(angle / kMotorDegreesPerSecond * 1000);
     auto tune = [&] { return cfg->TryTune(0, &usals); };
     // Each step: the operation, its result, then how long the motor runs and where it stops.
-    const struct {
-        const char* what;
-        std::function<int32_t()> op;
-        int32_t result;
-        int64_t runs;
-        int tenths;
-    } steps[] = {
+    const std::tuple<const char*, std::function<int32_t()>, int32_t, int64_t, int> steps[] = {
             {"to 19.2E", [&] { return cfg->GotoSatellite(0, 192, 0, 515) | tune(); }, kErrNoSignal,
              travel - 300, -1},
             {"0.45 degrees short", tune, kErrNoSignal, 300, int(std::lround(angle * 10))},
@@ -237,12 +227,12 @@ TEST_F(ReceiverTest, PositionerMovesAtMotorSpeedWithinItsLimits) {
             {"below the horizon", [&] { return cfg->GotoSatellite(0, 1800, 0, 515); },
              kErrBadParameter, 0, -1},
     };
-    for (const auto& s : steps) {
-        EXPECT_EQ(s.op(), s.result) << s.what;
-        advance(s.runs);
+    for (const auto& [what, op, result, runs, tenths] : steps) {
+        EXPECT_EQ(op(), result) << what;
+        advance(runs);
         auto moves = take(kEvtPositioner);
-        ASSERT_EQ(moves.empty(), s.tenths < 0) << s.what;
-        EXPECT_EQ(moves.empty() ? s.tenths : moves.back()[2], s.tenths) << s.what;
+        ASSERT_EQ(moves.empty(), tenths < 0) << what;
+        EXPECT_EQ(moves.empty() ? tenths : moves.back()[2], tenths) << what;
     }
 }
 
@@ -432,17 +422,14 @@ TEST_F(ReceiverTest, TheDatabaseOpensOrSaysWhyNotAndCollectedServicesFillItOnceF
     EXPECT_EQ(strm->EpgMd_AddService(&unknown), kErrNoService);
     ASSERT_EQ(strm->EpgMd_AddService(&kKanal), kOk);  // kept for the database to come
     // Dvb_SystemInit checks the path; the service thread opens the file, then says how it went.
-    const struct {
-        std::string path;
-        int32_t result;
-        Events ready;
-    } inits[] = {{dir / "missing/epg.db", kErrPath, {}},
-                 {dir.path, kOk, {{kEvtSystemReady, kErrDatabase, 0}}},
-                 {text, kOk, {{kEvtSystemReady, kErrDatabase, 0}}},
-                 {path, kOk, {{kEvtSystemReady, 0, 0}}}};
-    for (const auto& c : inits) {
-        EXPECT_EQ(systemInit(c.path), c.result) << c.path;
-        EXPECT_EQ(take(kEvtSystemReady), c.ready) << c.path;
+    const std::tuple<std::string, int32_t, Events> inits[] = {
+            {dir / "missing/epg.db", kErrPath, {}},
+            {dir.path, kOk, {{kEvtSystemReady, kErrDatabase, 0}}},
+            {text, kOk, {{kEvtSystemReady, kErrDatabase, 0}}},
+            {path, kOk, {{kEvtSystemReady, 0, 0}}}};
+    for (const auto& [at, result, ready] : inits) {
+        EXPECT_EQ(systemInit(at), result) << at;
+        EXPECT_EQ(take(kEvtSystemReady), ready) << at;
     }
     ASSERT_EQ(strm->EpgMd_AddService(&kGunes), kOk);
     ASSERT_EQ(strm->EpgMd_AddService(&kKanal), kOk);  // again: nothing new to store
@@ -605,10 +592,7 @@ TEST(SubtitleData, StaysWithinTheBuffersRoom) {
 
 TEST(SubtitleData, DefaultClutHasTheStandardsColours) {
     const SUBTTL_Clut& c = defaultClut();
-    const struct {
-        const SUBTTL_ClutEntry& entry;
-        std::array<int, 4> ycrcbt;
-    } cases[] = {
+    const std::pair<const SUBTTL_ClutEntry&, std::array<int, 4>> cases[] = {
             {c.c_2b[0], {0, 128, 128, 255}},   {c.c_2b[1], {235, 128, 128, 0}},
             {c.c_2b[2], {16, 128, 128, 0}},    {c.c_2b[3], {126, 128, 128, 0}},
             {c.c_4b[4], {41, 110, 240, 0}},    {c.c_4b[9], {49, 184, 109, 0}},
@@ -616,8 +600,8 @@ TEST(SubtitleData, DefaultClutHasTheStandardsColours) {
             {c.c_8b[0x10], {60, 203, 103, 0}}, {c.c_8b[0x4C], {41, 110, 240, 128}},
             {c.c_8b[0x88], {16, 128, 128, 0}}, {c.c_8b[0xD6], {181, 141, 159, 0}},
     };
-    for (const auto& k : cases)
-        EXPECT_EQ((std::array<int, 4>{k.entry.y, k.entry.cr, k.entry.cb, k.entry.t}), k.ycrcbt);
+    for (const auto& [e, ycrcbt] : cases)
+        EXPECT_EQ((std::array<int, 4>{e.y, e.cr, e.cb, e.t}), ycrcbt);
 }
 
 TEST_F(DecodersTest, NewDisplaySetsAndPageSendingsRaiseTheirEvents) {
@@ -647,13 +631,8 @@ TEST_F(DecodersTest, NewDisplaySetsAndPageSendingsRaiseTheirEvents) {
 
 TEST_F(DecodersTest, TeletextPageImageShowsCharactersWithTheirAttributes) {
     constexpr uint16_t DH = kCellDoubleHeight, Lower = kCellLowerHalf, Mosaic = kCellMosaic;
-    const struct {
-        int32_t page;
-        int row, col;
-        char32_t ch;
-        uint8_t fg, bg;
-        uint16_t flags;
-    } cases[] = {
+    // Page, row, column; the character, its colours and its flags.
+    const std::tuple<int32_t, int, int, char32_t, uint8_t, uint8_t, uint16_t> cases[] = {
             {0x100, 0, 1, U'P', kTtxWhite, kTtxBlack, 0},
             {0x100, 0, 39, U'1', kTtxWhite, kTtxBlack, 0},  // the clock: 20:00:01
             {0x100, 1, 1, U' ', kTtxBlue, kTtxBlue, 0},     // new background, set at
@@ -676,13 +655,13 @@ TEST_F(DecodersTest, TeletextPageImageShowsCharactersWithTheirAttributes) {
             {0x777, 1, 8, U'\U0001FB1F', kTtxGreen, kTtxBlack, Mosaic},
             {0x777, 1, 9, U'B', kTtxGreen, kTtxBlack, 0},
     };
-    for (const auto& k : cases) {
-        ASSERT_EQ(select(k.page), kOk);
+    for (const auto& [page, row, col, ch, fg, bg, flags] : cases) {
+        ASSERT_EQ(select(page), kOk);
         const TeltxtImage i = image();
-        const TeltxtCellRecord& c = i.cells[k.row][k.col];
+        const TeltxtCellRecord& c = i.cells[row][col];
         EXPECT_EQ(std::vector<uint32_t>({c.ch, c.foreground, c.background, c.flags}),
-                  std::vector<uint32_t>({k.ch, k.fg, k.bg, k.flags}))
-                << std::hex << k.page << std::dec << " row " << k.row << " col " << k.col;
+                  std::vector<uint32_t>({ch, fg, bg, flags}))
+                << std::hex << page << std::dec << " row " << row << " col " << col;
     }
     select(0x150);
     const TeltxtImage i = image();
@@ -696,19 +675,15 @@ TEST_F(DecodersTest, TeletextPageImageShowsCharactersWithTheirAttributes) {
 }
 
 TEST_F(DecodersTest, NavigationFollowsTheLinksOrThePagesPresent) {
-    const struct {
-        int32_t page;
-        int32_t result;
-        std::array<int32_t, 4> nav;
-    } cases[] = {
+    const std::tuple<int32_t, int32_t, std::array<int32_t, 4>> cases[] = {
             {0x200, kOk, {0x101, 0x200, 0x300, 0x150}},  // red, green, yellow, cyan
             {0x150, kOk, {0x888, 0x100, 0x200, 0x200}},
             {0x555, kErrNoData, {0x300, 0x300, 0x777, 0x777}},
             {0x900, kErrBadParameter, {0, 0, 0, 0}},
     };
-    for (const auto& k : cases) {
-        EXPECT_EQ(select(k.page), k.result) << std::hex << k.page;
-        EXPECT_EQ(nav, k.nav) << std::hex << k.page;
+    for (const auto& [page, result, links] : cases) {
+        EXPECT_EQ(select(page), result) << std::hex << page;
+        EXPECT_EQ(nav, links) << std::hex << page;
     }
 }
 
