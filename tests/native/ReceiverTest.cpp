@@ -238,35 +238,30 @@ TEST_F(ReceiverTest, PositionerMovesAtMotorSpeedWithinItsLimits) {
 
 // A scan stopped midway (stopAt > 0) keeps what it found and reports no completion.
 TEST_F(ReceiverTest, EachKindOfScanFindsItsServicesInItsTime) {
-    const struct {
-        const char* what;
-        int32_t type;
-        P fe;
-        std::set<int> services;
-        size_t transponders;
-        int64_t millis, stopAt = 0;
-    } cases[] = {
-            {"one transponder", kScanSingle, sat(12551500, 1), {28006, 28007, 28008}, 1, 1900},
-            {"NIT", kScanNetwork, sat(11493750, 0), {10301, 10302, 28006, 28007, 28008}, 2, 4300},
-            {"NIT, stopped", kScanNetwork, sat(11493750, 0), {10301, 10302}, 1, 5000, 3000},
-            {"nothing there", kScanSingle, sat(11000000, 0), {}, 0, 1000},
-            {"terrestrial band", kScanFullBand, terrestrial(0), {257, 258, 513, 514}, 2, 15400},
-            {"cable band", kScanFullBand, cable(0), {101, 102, 201, 202}, 2, 18800},
-            {"satellite at 13.0E", kScanFullBand, sat(0, 0, 130), {5001, 5002}, 1, 13900},
+    const P astra = sat(11493750, 0);
+    // What, the scan and where, the services and transponders found, when it ends, when stopped.
+    const std::tuple<const char*, int32_t, P, std::set<int>, size_t, int64_t, int64_t> cases[] = {
+            {"one transponder", kScanSingle, sat(12551500, 1), {28006, 28007, 28008}, 1, 1900, 0},
+            {"NIT", kScanNetwork, astra, {10301, 10302, 28006, 28007, 28008}, 2, 4300, 0},
+            {"NIT, stopped", kScanNetwork, astra, {10301, 10302}, 1, 5000, 3000},
+            {"nothing there", kScanSingle, sat(11000000, 0), {}, 0, 1000, 0},
+            {"terrestrial band", kScanFullBand, terrestrial(0), {257, 258, 513, 514}, 2, 15400, 0},
+            {"cable band", kScanFullBand, cable(0), {101, 102, 201, 202}, 2, 18800, 0},
+            {"satellite at 13.0E", kScanFullBand, sat(0, 0, 130), {5001, 5002}, 1, 13900, 0},
     };
-    for (const auto& c : cases) {
-        SCOPED_TRACE(c.what);
+    for (const auto& [what, type, fe, services, transponders, millis, stopAt] : cases) {
+        SCOPED_TRACE(what);
         SCNM_OpenSettings open{0, 0};
         int32_t h = scnm->Open(&open);
         ASSERT_GT(h, 0);
         SCNM_StartSettings start{};
-        start.fe = c.fe, start.scanType = c.type;
+        start.fe = fe, start.scanType = type;
         ASSERT_EQ(scnm->Start(h, &start), kOk);
         EXPECT_EQ(scnm->Start(h, &start), kErrBusy);
-        const bool stopped = c.stopAt > 0;
-        advance(c.stopAt);
+        const bool stopped = stopAt > 0;
+        advance(stopAt);
         EXPECT_EQ(stopped ? scnm->Stop(h) : kOk, kOk);
-        advance(c.millis - c.stopAt - 1);
+        advance(millis - stopAt - 1);
         SCNM_GetStatus st{};
         scnm->GetStatus(h, &st);
         EXPECT_EQ(st.result, stopped ? kScanStopped : kScanRunning);
@@ -280,20 +275,20 @@ TEST_F(ReceiverTest, EachKindOfScanFindsItsServicesInItsTime) {
         EXPECT_EQ(progress.back(), (std::array<int, 3>{kEvtScanProgress, h, st.sfStatus}));
         EXPECT_TRUE(std::is_sorted(progress.begin(), progress.end()));
         EXPECT_EQ(take(kEvtScanComplete),
-                  (stopped ? Events{} : Events{{kEvtScanComplete, h, int(c.services.size())}}));
+                  (stopped ? Events{} : Events{{kEvtScanComplete, h, int(services.size())}}));
 
         SCNM_ServiceInfo* svc = nullptr;
-        EXPECT_EQ(scnm->CreateServiceList(h, &svc), static_cast<int32_t>(c.services.size()));
+        EXPECT_EQ(scnm->CreateServiceList(h, &svc), static_cast<int32_t>(services.size()));
         std::set<int> found;
         for (; svc != nullptr; svc = const_cast<SCNM_ServiceInfo*>(dvbListNext(svc)))
             found.insert(svc->svcId);
-        EXPECT_EQ(found, c.services);
+        EXPECT_EQ(found, services);
         SCNMNET_FrontEndSettings* net = nullptr;
         scnm->CreateNetworkList(h, &net);
         std::vector<int32_t> types;
         for (; net != nullptr; net = const_cast<SCNMNET_FrontEndSettings*>(dvbListNext(net)))
             types.push_back(net->type);
-        EXPECT_EQ(types, std::vector<int32_t>(c.transponders, c.fe.type));
+        EXPECT_EQ(types, std::vector<int32_t>(transponders, fe.type));
         EXPECT_EQ(scnm->Close(h), kOk);
     }
 }
