@@ -64,12 +64,9 @@ protected:
 };
 
 TEST_F(EpgDatabaseTest, ANewVersionReplacesOnlyItsOwnSectionAndAllSurvivesARestart) {
-    struct Step {
-        ServiceKey service;
-        uint8_t table, section, version;
-        std::vector<uint16_t> events;
-        std::vector<int> expected;  // the events of kSvc afterwards, by start
-    } const steps[] = {
+    // Service, table, section, version, the events stored; the events of kSvc afterwards, by start.
+    using Ids = std::vector<int>;
+    const std::tuple<ServiceKey, uint8_t, uint8_t, uint8_t, std::vector<uint16_t>, Ids> steps[] = {
             {kSvc, 0x50, 0, 1, {1, 2}, {1, 2}},
             {kSvc, 0x50, 8, 1, {3}, {1, 2, 3}},
             {kSvc, 0x50, 0, 2, {4}, {3, 4}},
@@ -82,15 +79,15 @@ TEST_F(EpgDatabaseTest, ANewVersionReplacesOnlyItsOwnSectionAndAllSurvivesAResta
     auto db = open();
     ASSERT_TRUE(db->addService({kSvc, 1, 2, 3}) && db->addService({kOther, 4, 5, 6}));
     ASSERT_TRUE(db->addService({kSvc, 7, 8, 9}));  // updated in its place
-    for (const Step& s : steps) {
-        if (&s == &steps[7]) db = open();
+    for (const auto& step : steps) {
+        const auto& [service, table, section, version, stored, expected] = step;
+        if (&step == &steps[7]) db = open();
         std::vector<Event> events;
-        for (size_t i = 0; i < s.events.size(); ++i)
-            events.push_back(event(s.events[i], s.events[i] * 1000 + int64_t(i), 60, i * 999));
-        ASSERT_TRUE(db->storeSection(s.service, s.table, s.section, s.version, events))
-                << db->lastError();
-        EXPECT_EQ(ids(all(*db)), s.expected)
-                << "after section " << int(s.section) << " v" << int(s.version);
+        for (size_t i = 0; i < stored.size(); ++i)
+            events.push_back(event(stored[i], stored[i] * 1000 + int64_t(i), 60, i * 999));
+        ASSERT_TRUE(db->storeSection(service, table, section, version, events)) << db->lastError();
+        EXPECT_EQ(ids(all(*db)), expected)
+                << "after section " << int(section) << " v" << int(version);
     }
     EXPECT_EQ(dump(all(*db)),
               dump({event(4, 4000, 60, 0), event(5, 5000, 60, 0), event(7, 7000, 60, 0)}));
