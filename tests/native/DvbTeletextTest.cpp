@@ -156,13 +156,10 @@ TEST(DvbTeletext, KeepsWhatIsSoundOfDamagedUnits) {
     pair[1].number = 0x1FF;
     const std::vector<uint8_t> pes = encodeTeletextPes(pair, 2, 0);
     auto unit = [](int u, int at) { return size_t(46 + 46 * u + at); };
-    struct Case {
-        size_t offset;
-        uint8_t mask;
-        size_t pages;
-        uint32_t pesDropped, unitsDropped, packetsDropped, parityErrors;
-        int row, col;  // what is lost: a row (col -1), a character, the links (25) or charset (26)
-    } cases[] = {
+    // The byte, the bits flipped; the pages decoded; PES, units and packets dropped, parity errors;
+    // what is lost: a row (col -1), a character, the links (row 25) or the character set (26).
+    using U = uint32_t;
+    const std::tuple<size_t, uint8_t, size_t, U, U, U, U, int, int> cases[] = {
             {unit(0, 4), 0x01, 1, 0, 0, 0, 0, -1, 0},  // one bit: corrected
             {unit(0, 4), 0x03, 0, 0, 0, 1, 0, -1, 0},  // the header's address
             {unit(0, 6), 0x0C, 0, 0, 0, 1, 0, -1, 0},  // its page number
@@ -174,30 +171,30 @@ TEST(DvbTeletext, KeepsWhatIsSoundOfDamagedUnits) {
             {45, 0x30, 0, 1, 0, 0, 0, -1, 0},          // the data identifier
             {3, 0x01, 0, 1, 0, 0, 0, -1, 0},           // the stream id
     };
-    for (const Case& c : cases) {
+    for (const auto& [at, mask, count, pesOut, unitsOut, packetsOut, parity, row, col] : cases) {
         std::vector<uint8_t> damaged = pes;
-        damaged[c.offset] ^= c.mask;
+        damaged[at] ^= mask;
         TeletextDecoder decoder;
         std::vector<TeletextPage> pages;
         decoder.feed(damaged.data(), damaged.size(), 0, pages);
         const TeletextStats& st = decoder.stats();
         EXPECT_EQ(std::tie(st.pesDropped, st.unitsDropped, st.packetsDropped, st.parityErrors),
-                  std::tie(c.pesDropped, c.unitsDropped, c.packetsDropped, c.parityErrors))
-                << c.offset;
-        ASSERT_EQ(pages.size(), c.pages) << c.offset;
-        if (!c.pages) continue;
+                  std::tie(pesOut, unitsOut, packetsOut, parity))
+                << at;
+        ASSERT_EQ(pages.size(), count) << at;
+        if (!count) continue;
         TeletextPage want = original;
-        if (c.row == 26)
+        if (row == 26)
             want.charset = kNoCharset;
-        else if (c.row == 25)
+        else if (row == 25)
             want.links = {};
-        else if (c.row >= 0 && c.col < 0)
-            want.rows[c.row].fill(' ');
-        else if (c.row >= 0)
-            want.rows[c.row][c.col] = ' ';
+        else if (row >= 0 && col < 0)
+            want.rows[row].fill(' ');
+        else if (row >= 0)
+            want.rows[row][col] = ' ';
         EXPECT_EQ(std::tie(pages[0].rows, pages[0].links, pages[0].charset),
                   std::tie(want.rows, want.links, want.charset))
-                << c.offset;
+                << at;
     }
 }
 
