@@ -165,22 +165,19 @@ TEST_F(ReceiverTest, TuneLocksOnlyWhereTheModelHasATransponder) {
 
 TEST_F(ReceiverTest, LockIsAcquiredLostAndRegained) {
     P good = sat(11493750, 0), bad = sat(11493750, 1);
+    auto after = [&](int64_t ms) { return advance(ms), status().feStatus; };
     ASSERT_EQ(cfg->Tune(0, &good), kOk);
     EXPECT_EQ(std::make_tuple(status().feStatus, status().quality),
               std::make_tuple(kFeSignal | kFeCarrier, 0));
-    advance(200);
-    EXPECT_EQ(status().feStatus, kFeSignal | kFeCarrier | kFeViterbi);
-    advance(200);
+    EXPECT_EQ(after(200), kFeSignal | kFeCarrier | kFeViterbi);
+    EXPECT_EQ(after(200), 0x1F);
     ANT_Status st = status();
-    EXPECT_EQ(st.feStatus, 0x1F);
     EXPECT_TRUE(st.strength >= 40 && st.strength <= 90 && st.quality > 30) << st.strength;
     EXPECT_EQ(st.extStatus, st.quality * 3 / 2);
 
     ASSERT_EQ(cfg->Tune(0, &bad), kOk);
-    advance(999);
-    EXPECT_EQ(status().feStatus, 0);
-    advance(1);
-    EXPECT_EQ(status().feStatus, kFeTimedOut);
+    EXPECT_EQ(after(999), 0);
+    EXPECT_EQ(after(1), kFeTimedOut);
     ASSERT_EQ(cfg->Tune(0, &good), kOk);
     advance(400);
     // The same tuning again keeps the lock.
