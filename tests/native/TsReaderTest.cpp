@@ -75,9 +75,8 @@ TEST(TsReader, FrenchMultiplexMatchesItsTruth) {
     for (size_t i = 0; i < nit["transport_streams"].size(); ++i) {
         const json& ts = nit["transport_streams"][i];
         const Transport& got = net.transports[i];
-        EXPECT_EQ(got.tsid, ts["tsid"]);
-        EXPECT_EQ(got.onid, ts["onid"]);
-        EXPECT_EQ(got.tuning.delivery, Delivery::Terrestrial);
+        EXPECT_EQ(std::make_tuple(int(got.tsid), int(got.onid), got.tuning.delivery),
+                  std::make_tuple(int(ts["tsid"]), int(ts["onid"]), Delivery::Terrestrial));
         for (const json& lcn : ts["lcn_0x83"]) {
             const auto key = std::make_tuple(int(ts["onid"]), int(ts["tsid"]), int(lcn["sid"]));
             if (l.services.count(key) == 0) continue;  // listed, but in no SDT
