@@ -65,16 +65,10 @@ protected:
             std::lock_guard<std::mutex> lock(eventLock);
             events.push_back({msg, a, b});
         });
-        cfg = new ReceiverCfg(rx);
-        scnm = new ReceiverScnm(rx);
-        strm = new ReceiverStrm(rx);
-        subttl = new ReceiverSubttl(rx);
-        teltxt = new ReceiverTeltxt(rx);
+        cfg = new ReceiverCfg(rx), scnm = new ReceiverScnm(rx), strm = new ReceiverStrm(rx);
+        subttl = new ReceiverSubttl(rx), teltxt = new ReceiverTeltxt(rx);
     }
-    void advance(int64_t ms) {
-        rx->clock().advance(ms);
-        rx->sync();
-    }
+    void advance(int64_t ms) { rx->clock().advance(ms), rx->sync(); }
     // The events with a code in [from, to] in the order raised; the others stay.
     Events take(int from, int to = 0) {
         std::lock_guard<std::mutex> lock(eventLock);
@@ -113,10 +107,8 @@ protected:
         STRM_OpenSettings open{};
         *h = strm->Open(&open);
         STRM_Settings s{};
-        s.fe = p;
-        s.svcId = svc;
-        s.videoPid = static_cast<uint16_t>(svc == 28006 ? 0x201 : 0);
-        s.audioPid = static_cast<uint16_t>(svc == 28006 ? 0x202 : 0);
+        s.fe = p, s.svcId = svc, s.videoPid = svc == 28006 ? 0x201 : 0;
+        s.audioPid = svc == 28006 ? 0x202 : 0;
         return strm->Start(*h, &s);
     }
     ANT_Status status() {
