@@ -69,6 +69,14 @@ protected:
         subttl = new ReceiverSubttl(rx), teltxt = new ReceiverTeltxt(rx);
     }
     void advance(int64_t ms) { rx->clock().advance(ms), rx->sync(); }
+    int32_t startStream(const P& p, uint16_t svc, int32_t* h) {
+        STRM_OpenSettings open{};
+        *h = strm->Open(&open);
+        STRM_Settings s{};
+        s.fe = p, s.svcId = svc, s.videoPid = svc == 28006 ? 0x201 : 0;
+        s.audioPid = svc == 28006 ? 0x202 : 0;
+        return strm->Start(*h, &s);
+    }
     // The events with a code in [from, to] in the order raised; the others stay.
     Events take(int from, int to = 0) {
         std::lock_guard<std::mutex> lock(eventLock);
@@ -102,14 +110,6 @@ protected:
         unsetenv("DVB_EPG_DB");
         rx->sync();
         return result;
-    }
-    int32_t startStream(const P& p, uint16_t svc, int32_t* h) {
-        STRM_OpenSettings open{};
-        *h = strm->Open(&open);
-        STRM_Settings s{};
-        s.fe = p, s.svcId = svc, s.videoPid = svc == 28006 ? 0x201 : 0;
-        s.audioPid = svc == 28006 ? 0x202 : 0;
-        return strm->Start(*h, &s);
     }
     ANT_Status status() {
         ANT_Status st{};
@@ -488,11 +488,7 @@ protected:
         pages.insert(pages.begin(), crafted);
         start(std::move(b));
         service = &rx->broadcast().networks[3].transports[0].services[0];
-        STRM_OpenSettings open{};
-        stream = strm->Open(&open);
-        STRM_Settings s{};
-        s.fe.type = kTerrestrial, s.fe.frequency = 506000, s.svcId = 0x0311;
-        EXPECT_EQ(strm->Start(stream, &s), kOk);
+        EXPECT_EQ(startStream(terrestrial(506000), 0x0311, &stream), kOk);
         advance(1000);
         SUBTTL_Settings sub{};
         sub.pid = 0x105, sub.compositionPageId = sub.ancillaryPageId = 1, sub.hstrm = stream;
