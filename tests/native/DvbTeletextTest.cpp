@@ -146,9 +146,8 @@ TEST(DvbTeletext, BuiltinPagesTravelToLibzvbiAndBack) {
     EXPECT_GT(checked, 0u);
 }
 
-// The data units of one page: 0 its header, 1 its links, 2 its character set, 3.. rows 1..24;
-// in each, byte 3 the framing code, bytes 4.. the packet (4, 5 the address, 6.. the page number
-// or the text).
+// A page's data units: 0 its header, 1 its links, 2 its character set, 3.. rows 1..24; in each,
+// byte 3 the framing code, 4.. the packet (4, 5 the address, 6.. the page number or the text).
 TEST(DvbTeletext, KeepsWhatIsSoundOfDamagedUnits) {
     TeletextPage original = builtinBroadcast(0).networks[0].transports[0].services[0].teletext[0];
     original.charset = 0x15;

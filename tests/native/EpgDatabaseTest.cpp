@@ -93,10 +93,9 @@ TEST_F(EpgDatabaseTest, ANewVersionReplacesOnlyItsOwnSectionAndAllSurvivesAResta
               dump({event(4, 4000, 60, 0), event(5, 5000, 60, 0), event(7, 7000, 60, 0)}));
     EXPECT_EQ(dump(all(*db, kOther)), dump({event(6, 6000, 60, 0)}));
     std::string services;
-    for (const auto& v : db->services()) {
+    for (const auto& v : db->services())
         services += std::to_string(v.key.sid) + ":" + std::to_string(v.tpIndex) +
                     std::to_string(v.netIndex) + std::to_string(v.netType) + " ";
-    }
     EXPECT_EQ(services, "3:789 4:456 ");
     ASSERT_TRUE(db->clearServices());
     EXPECT_TRUE(open()->services().empty());

@@ -174,10 +174,8 @@ TEST(TsWriter, EveryBuiltinTransportReadsBackToTheSameModelAndInFfprobe) {
                 EXPECT_EQ(describe(got, midnight, midnight + 8 * 86400),
                           describe(want, midnight, midnight + 8 * 86400));
                 // Timed content: each display set and teletext sending read back is the model's
-                // one of its time within the loop.
+                // one of its loop time plus the PTS's decode delay (times count from the span).
                 for (const DisplaySet& ds : got.subtitles) {
-                    // Times count from the first PCR, the span's start: the loop's time plus
-                    // the decode delay of the PTS.
                     auto same = [&](const DisplaySet& m) {
                         return m.time + kTsDecodeDelayMs == ds.time && describe(m) == describe(ds);
                     };
