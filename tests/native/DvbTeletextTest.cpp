@@ -171,6 +171,7 @@ TEST(DvbTeletext, KeepsWhatIsSoundOfDamagedUnits) {
             {3, 0x01, 0, 1, 0, 0, 0, -1, 0},           // the stream id
     };
     for (const auto& [at, mask, count, pesOut, unitsOut, packetsOut, parity, row, col] : cases) {
+        SCOPED_TRACE(at);
         std::vector<uint8_t> damaged = pes;
         damaged[at] ^= mask;
         TeletextDecoder decoder;
@@ -178,9 +179,8 @@ TEST(DvbTeletext, KeepsWhatIsSoundOfDamagedUnits) {
         decoder.feed(damaged.data(), damaged.size(), 0, pages);
         const TeletextStats& st = decoder.stats();
         EXPECT_EQ(std::tie(st.pesDropped, st.unitsDropped, st.packetsDropped, st.parityErrors),
-                  std::tie(pesOut, unitsOut, packetsOut, parity))
-                << at;
-        ASSERT_EQ(pages.size(), count) << at;
+                  std::tie(pesOut, unitsOut, packetsOut, parity));
+        ASSERT_EQ(pages.size(), count);
         if (!count) continue;
         TeletextPage want = original;
         if (row == 26)
@@ -192,8 +192,7 @@ TEST(DvbTeletext, KeepsWhatIsSoundOfDamagedUnits) {
         else if (row >= 0)
             want.rows[row][col] = ' ';
         EXPECT_EQ(std::tie(pages[0].rows, pages[0].links, pages[0].charset),
-                  std::tie(want.rows, want.links, want.charset))
-                << at;
+                  std::tie(want.rows, want.links, want.charset));
     }
 }
 

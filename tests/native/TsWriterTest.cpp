@@ -5,12 +5,13 @@
 #include <gtest/gtest.h>
 #include <receiver/Modules.h>
 #include "Captures.h"
-// clang-format off
+// libdvbpsi's headers each need the ones before them: the core first, then the descriptors.
 #include <dvbpsi/dvbpsi.h>
+
 #include <dvbpsi/descriptor.h>
+
 #include <dvbpsi/demux.h>
 #include <dvbpsi/eit.h>
-// clang-format on
 
 #include <algorithm>
 #include <cstdio>
@@ -137,6 +138,7 @@ TEST(TsWriter, EveryBuiltinTransportReadsBackToTheSameModelAndInFfprobe) {
     size_t subtitles = 0, pages = 0;
     for (const Network& n : b.networks)
         for (const Transport& t : n.transports) {
+            SCOPED_TRACE("transport " + std::to_string(t.tsid));
             std::vector<uint8_t> ts;
             TsWriterState state;
             TsWriterOptions options;
@@ -144,7 +146,7 @@ TEST(TsWriter, EveryBuiltinTransportReadsBackToTheSameModelAndInFfprobe) {
             writeTransport(b, n, t, kStart, spanMs, ts, state, options);
             EXPECT_EQ(state.stats().sectionsDropped, 0u);
             if (ffprobe) {
-                EXPECT_EQ(probe(dir.write("tp.ts", ts)), expected(t)) << "transport " << t.tsid;
+                EXPECT_EQ(probe(dir.write("tp.ts", ts)), expected(t));
             }
             TsCapture c;
             TsReadStats stats;
@@ -160,14 +162,13 @@ TEST(TsWriter, EveryBuiltinTransportReadsBackToTheSameModelAndInFfprobe) {
             for (const Network& m : c.networks)
                 for (const Transport& u : m.transports)
                     if (u.onid == t.onid && u.tsid == t.tsid) rn = &m, rt = &u;
-            ASSERT_NE(rt, nullptr) << t.tsid;
+            ASSERT_NE(rt, nullptr);
             EXPECT_EQ(std::tie(rn->id, rn->name, rn->delivery), std::tie(n.id, n.name, n.delivery));
             const Tuning &a = rt->tuning, &w = t.tuning;
             EXPECT_EQ(std::make_tuple(a.delivery, a.frequencyKHz, a.symbolRate, a.modulation, a.fec,
                                       a.polarization, a.orbitalPosition, a.bandwidthKHz),
                       std::make_tuple(w.delivery, w.frequencyKHz, w.symbolRate, w.modulation, w.fec,
-                                      w.polarization, w.orbitalPosition, w.bandwidthKHz))
-                    << t.tsid;
+                                      w.polarization, w.orbitalPosition, w.bandwidthKHz));
             ASSERT_EQ(rt->services.size(), t.services.size());
             for (size_t i = 0; i < t.services.size(); ++i) {
                 const Service &want = t.services[i], &got = rt->services[i];
