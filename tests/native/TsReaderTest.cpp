@@ -46,7 +46,10 @@ Loaded load(const std::string& setting) {
 TEST(TsReader, FrenchMultiplexMatchesItsTruth) {
     NEED_CAPTURE("fr-dvbt-multiplex-si.ts");
     const json t = truth("fr-dvbt-multiplex-si");
-    const Loaded l = load(kDir + "/fr-dvbt-multiplex-si.ts");
+    TempDir dir;
+    const std::string rel = fs::relative(kDir + "/fr-dvbt-multiplex-si.ts", dir.path);
+    const Loaded l = load(dir.write(
+            "fr.broadcast", "# the French multiplex R4\n" + rel + "  terrestrial 482000 7000\n"));
     EXPECT_EQ(l.b.start, utc(t["time"]["tdt_first_utc"]));
     EXPECT_EQ(l.b.loopMillis,
               1000 * (utc(t["time"]["tdt_last_utc"]) - utc(t["time"]["tdt_first_utc"])));
@@ -65,8 +68,7 @@ TEST(TsReader, FrenchMultiplexMatchesItsTruth) {
     }
     EXPECT_EQ(services, 46u);
 
-    // NIT: the network, its transports in order, their LCNs; every centre frequency is
-    // 0xFFFFFFFF, so the frequency rule tunes them (its test below).
+    // NIT: the network, its transports in order, their LCNs.
     const json& nit = t["nit"][0];
     const Network& net = l.b.networks.at(0);
     EXPECT_EQ(net.id, nit["network_id"]);
@@ -84,6 +86,16 @@ TEST(TsReader, FrenchMultiplexMatchesItsTruth) {
             EXPECT_EQ(l.services.at(key)->visible, lcn["visible"] == 1);
         }
     }
+
+    // Every centre frequency in the NIT is 0xFFFFFFFF: the file tunes tsid 4, the frequency rule
+    // the others, skipping 482000.
+    std::map<int, std::pair<uint32_t, uint32_t>> tunings,  // tsid: kHz, bandwidth
+            rule = {{1, {474000, 8000}},  {2, {490000, 8000}},  {3, {498000, 8000}},
+                    {4, {482000, 7000}},  {6, {506000, 8000}},  {8, {514000, 8000}},
+                    {10, {522000, 8000}}, {13, {530000, 8000}}, {15, {538000, 8000}}};
+    for (const Transport& tp : net.transports)
+        tunings[tp.tsid] = {tp.tuning.frequencyKHz, tp.tuning.bandwidthKHz};
+    EXPECT_EQ(tunings, rule);
 
     // EIT present/following and schedule: every event of every service, merged by event id.
     std::map<const Service*, std::set<int>> ids;
@@ -244,20 +256,4 @@ TEST(TsReader, BroadcastLinesGiveTheirTuning) {
         EXPECT_EQ(got.str(), want) << text;
         EXPECT_TRUE(line.tuned);
     }
-}
-
-TEST(TsReader, BroadcastFileTunesItsCaptureAndTheRuleTheRest) {
-    NEED_CAPTURE("fr-dvbt-multiplex-si.ts");
-    TempDir dir;
-    const std::string rel = fs::relative(kDir + "/fr-dvbt-multiplex-si.ts", dir.path);
-    const Loaded l = load(dir.write(
-            "fr.broadcast", "# the French multiplex R4\n" + rel + "  terrestrial 482000 7000\n"));
-    // The capture's own transport (tsid 4) takes the file's tuning; the rule skips 482000.
-    std::map<int, std::pair<uint32_t, uint32_t>> got,  // tsid: kHz, bandwidth
-            want = {{1, {474000, 8000}},  {2, {490000, 8000}},  {3, {498000, 8000}},
-                    {4, {482000, 7000}},  {6, {506000, 8000}},  {8, {514000, 8000}},
-                    {10, {522000, 8000}}, {13, {530000, 8000}}, {15, {538000, 8000}}};
-    for (const Transport& t : l.b.networks.at(0).transports)
-        got[t.tsid] = {t.tuning.frequencyKHz, t.tuning.bandwidthKHz};
-    EXPECT_EQ(got, want);
 }
