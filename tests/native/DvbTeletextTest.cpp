@@ -109,7 +109,6 @@ TEST(DvbTeletext, DecodesArteAsLibzvbiDid) {
 }
 
 TEST(DvbTeletext, BuiltinPagesTravelToLibzvbiAndBack) {
-    size_t checked = 0;
     for (const Network& n : builtinBroadcast(1767290400).networks)
         for (const Transport& t : n.transports)
             for (const Service& s : t.services) {
@@ -133,7 +132,7 @@ TEST(DvbTeletext, BuiltinPagesTravelToLibzvbiAndBack) {
                 Zvbi zvbi(pes);
                 ASSERT_EQ(back.size(), sent.size());
                 ASSERT_EQ(zvbi.pages.size(), sent.size());
-                for (size_t i = 0; i < back.size(); ++i, ++checked) {
+                for (size_t i = 0; i < back.size(); ++i) {
                     const TeletextPage &a = sent[i], &b = back[i];
                     EXPECT_EQ(std::tie(a.number, a.subcode, a.controlBits, a.rows, a.links,
                                        a.charset),
@@ -143,7 +142,6 @@ TEST(DvbTeletext, BuiltinPagesTravelToLibzvbiAndBack) {
                               std::make_tuple(int(a.number), int(a.subcode), print(a)));
                 }
             }
-    EXPECT_GT(checked, 0u);
 }
 
 // A page's data units: 0 its header, 1 its links, 2 its character set, 3.. rows 1..24; in each,
