@@ -135,7 +135,7 @@ TEST(TsWriter, EveryBuiltinTransportReadsBackToTheSameModelAndInFfprobe) {
     TempDir dir;
     Broadcast b = builtinBroadcast(kStart / 1000);
     const int64_t midnight = kStart / 1000 / 86400 * 86400;
-    size_t subtitles = 0, pages = 0;
+    size_t pages = 0;
     for (const Network& n : b.networks)
         for (const Transport& t : n.transports) {
             SCOPED_TRACE("transport " + std::to_string(t.tsid));
@@ -182,7 +182,6 @@ TEST(TsWriter, EveryBuiltinTransportReadsBackToTheSameModelAndInFfprobe) {
                     };
                     EXPECT_TRUE(std::any_of(want.subtitles.begin(), want.subtitles.end(), same))
                             << want.id << " display set at " << ds.time;
-                    ++subtitles;
                 }
                 for (const TeletextPage& p : got.teletext) {
                     auto same = [&](const TeletextPage& m) {
@@ -197,7 +196,6 @@ TEST(TsWriter, EveryBuiltinTransportReadsBackToTheSameModelAndInFfprobe) {
                 }
             }
         }
-    EXPECT_GT(subtitles, 0u);
     EXPECT_GT(pages, 0u);
     if (!ffprobe)
         GTEST_SKIP() << "ffprobe is not on PATH (Debian package ffmpeg): no independent reader";
