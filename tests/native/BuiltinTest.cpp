@@ -227,8 +227,7 @@ TEST(Builtin, TeletextPagesAreLevelOneWithWorkingLinks) {
         EXPECT_GE(versions[0x101].size(), 3u);   // rotating subpages
         EXPECT_GE(versions[0x888].size(), 10u);  // subtitles that change
         EXPECT_EQ(bits & 0x60, 0x60);            // a newsflash (C5) and a subtitle page (C6)
-        const bool german = ttx->language == "deu";
-        EXPECT_EQ((bits >> 12) & 7, german ? 4 : 0);  // C12..C14, German: C14
+        EXPECT_EQ((bits >> 12) & 7, ttx->language == "deu" ? 4 : 0);  // C12..C14, German: C14
     });
     EXPECT_GE(services, 2);
 }
