@@ -201,10 +201,9 @@ TEST(DvbSubtitle, RoundTripThroughTheEncoder) {
 
     // A normal case with unchanged versions is not applied again; new versions are.
     DisplaySet update = s;
-    update.state = 0;
+    update.state = 0, update.cluts[1].c4[5] = ClutEntry{80, 90, 100, 0};
     update.placements.pop_back();
     for (uint8_t& p : update.regions[0].pixels) p = 3;
-    update.cluts[1].c4[5] = ClutEntry{80, 90, 100, 0};
     out = decode(decoder, {encodeDisplaySet(update, 3, 1)});
     ASSERT_EQ(out.size(), 1u);
     EXPECT_TRUE(flat(out[0]) == flat(s));
@@ -255,8 +254,7 @@ TEST(DvbSubtitle, DamagedSegmentsAreDroppedAndCounted) {
         std::vector<DisplaySet> out = decode(decoder, {pes});
         // A display set that lost its end comes out when the next page composition arrives.
         decoder.feed(nullptr, 0, out);
-        std::vector<uint8_t> next = encodeDisplaySet(DisplaySet(), 3, 0);
-        if (out.empty()) decoder.feed(next.data(), next.size(), out);
+        if (out.empty()) out = decode(decoder, {encodeDisplaySet(DisplaySet(), 3, 0)});
         ASSERT_FALSE(out.empty());
         EXPECT_GT(decoder.stats().*c.counter, 0u);
         EXPECT_EQ(decoder.stats().pesDropped, 1u);  // the null packet
