@@ -5,6 +5,7 @@
 #include <time.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <map>
 #include <set>
@@ -94,52 +95,46 @@ std::string decode(const std::string& bytes) {
 TEST(Builtin, CarriesEnoughOfEveryKindWithUniqueIdsAndAWeekOfEvents) {
     std::map<Delivery, int> transports;
     std::set<int> positions;
-    std::set<std::pair<int, int>> tsids, sids;
-    std::map<std::string, char> names;  // decoded name -> first byte of the broadcast bytes
+    std::set<std::pair<int, int>> tsids, sids;  // each unique
+    std::map<std::string, char> names;          // decoded name -> first byte of the broadcast bytes
     int services = 0, radio = 0, tv = 0, hd = 0, scrambled = 0;
     const int64_t firstDay = kStart - kStart % kDay;
-    for (const Network& n : broadcast().networks) {
+    for (const Network& n : broadcast().networks)
         for (const Transport& t : n.transports) {
             EXPECT_EQ(t.tuning.delivery, n.delivery);
             ++transports[n.delivery];
-            tsids.insert({t.onid, t.tsid});
+            EXPECT_TRUE(tsids.insert({t.onid, t.tsid}).second) << t.tsid;
             if (n.delivery == Delivery::Satellite) positions.insert(t.tuning.orbitalPosition);
             std::set<int> pids;
             size_t expected = 0;
             for (const Service& s : t.services) {
                 pids.insert(s.pmtPid);
-                bool pcrFound = false;
-                for (const Component& c : s.components) {
-                    pids.insert(c.pid);
-                    pcrFound |= c.pid == s.pcrPid;
-                    EXPECT_LT(c.pid, 0x1FFF);
-                }
-                EXPECT_TRUE(pcrFound) << s.name;
+                for (const Component& c : s.components) pids.insert(c.pid);
+                EXPECT_TRUE(std::any_of(s.components.begin(), s.components.end(), [&](auto& c) {
+                    return c.pid == s.pcrPid;
+                })) << s.name;
                 expected += 1 + s.components.size();
                 ++services, radio += s.type == 0x02, tv += s.type == 0x01 || s.type == 0x19;
                 hd += s.type == 0x19, scrambled += s.scrambled && !s.caSystems.empty();
-                sids.insert({t.onid, s.id});
+                EXPECT_TRUE(sids.insert({t.onid, s.id}).second) << s.name;
                 names[decode(s.name)] = s.name[0];
-                EXPECT_NE(decode(s.provider), "<invalid>");
+                EXPECT_TRUE(!s.provider.empty() && decode(s.provider) != "<invalid>") << s.name;
                 EXPECT_NE(s.lcn, 0) << s.name;
-                EXPECT_FALSE(s.provider.empty()) << s.name;
                 ASSERT_FALSE(s.events.empty()) << s.name;
                 std::set<int> ids;
                 int64_t end = firstDay;
                 for (const Event& e : s.events) {
                     EXPECT_EQ(e.start, end) << s.name << " event " << e.id;
                     EXPECT_GT(e.duration, 0u);
-                    EXPECT_NE(decode(e.name), "<invalid>");
-                    EXPECT_FALSE(e.name.empty());
-                    ids.insert(e.id);
+                    EXPECT_TRUE(!e.name.empty() && decode(e.name) != "<invalid>") << e.id;
+                    EXPECT_TRUE(ids.insert(e.id).second) << e.id;
                     end = e.start + e.duration;
                 }
                 EXPECT_EQ(end, firstDay + 7 * kDay) << s.name;
-                EXPECT_EQ(ids.size(), s.events.size());
             }
             EXPECT_EQ(pids.size(), expected) << t.tsid;
+            EXPECT_LT(*pids.rbegin(), 0x1FFF) << t.tsid;
         }
-    }
     EXPECT_GE(transports[Delivery::Satellite], 3);
     EXPECT_GE(positions.size(), 2u);
     EXPECT_GE(transports[Delivery::Cable], 2);
@@ -147,9 +142,6 @@ TEST(Builtin, CarriesEnoughOfEveryKindWithUniqueIdsAndAWeekOfEvents) {
     EXPECT_GE(services, 20);
     EXPECT_TRUE(radio && tv && hd);
     EXPECT_EQ(scrambled, 1);
-    EXPECT_EQ(sids.size(), size_t(services));
-    EXPECT_EQ(tsids.size(), size_t(transports[Delivery::Satellite] + transports[Delivery::Cable] +
-                                   transports[Delivery::Terrestrial]));
     const std::pair<const char*, char> expected[] = {
             {"Südwelle HD", 'S'}, {"Straßenfeger Radio", 'S'}, {"Güneş TV", 0x05},
             {"Ελλάδα TV", 0x03},  {"Česká Vlna", 0x10},        {"Łódź TV", 0x10},
@@ -185,16 +177,13 @@ TEST(Builtin, DisplaySetsFitTheirDisplayAndTheirColourTables) {
                 ASSERT_EQ(r.pixels.size(), size_t(r.width) * r.height);
                 EXPECT_LE(r.pixels.size(), 384000u);
                 EXPECT_LE(r.objects.size(), 16u);
-                bool clut = false;
-                for (const Clut& c : ds.cluts) clut |= c.id == r.clutId;
-                EXPECT_TRUE(clut);
+                EXPECT_TRUE(std::any_of(ds.cluts.begin(), ds.cluts.end(),
+                                        [&](auto& c) { return c.id == r.clutId; }));
                 depths.insert(r.depth);
-                int glyph = 0, outOfTable = 0;
-                for (uint8_t p : r.pixels) {
-                    outOfTable += p >= (1 << (2 << (r.depth - 1)));
-                    glyph += p > 1;  // above the box colour
-                }
-                EXPECT_EQ(outOfTable, 0);
+                int glyph = 0;  // pixels above the box colour
+                for (uint8_t p : r.pixels) glyph += p > 1;
+                EXPECT_LT(*std::max_element(r.pixels.begin(), r.pixels.end()),
+                          1 << (2 << (r.depth - 1)));
                 EXPECT_GT(glyph, 100) << "time " << ds.time;
             }
         }
@@ -238,8 +227,7 @@ TEST(Builtin, TeletextPagesAreLevelOneWithWorkingLinks) {
         EXPECT_GE(versions[0x101].size(), 3u);   // rotating subpages
         EXPECT_GE(versions[0x888].size(), 10u);  // subtitles that change
         EXPECT_EQ(bits & 0x60, 0x60);            // a newsflash (C5) and a subtitle page (C6)
-        const bool german = ttx->language == "deu";
-        EXPECT_EQ((bits >> 12) & 7, german ? 4 : 0);  // C12..C14, German: C14
+        EXPECT_EQ((bits >> 12) & 7, ttx->language == "deu" ? 4 : 0);  // C12..C14, German: C14
     });
     EXPECT_GE(services, 2);
 }

@@ -43,9 +43,8 @@ inline Packets pes(const std::string& capture, uint16_t pid) {
 // Bytes written in hex, spaces between them for the eye.
 inline std::string unhex(const std::string& h) {
     std::string b;
-    for (size_t i = 0; i + 1 < h.size(); i += h[i] == ' ' ? 1 : 2) {
+    for (size_t i = 0; i + 1 < h.size(); i += h[i] == ' ' ? 1 : 2)
         if (h[i] != ' ') b += char(std::stoi(h.substr(i, 2), nullptr, 16));
-    }
     return b;
 }
 
@@ -57,6 +56,13 @@ struct TempDir {
     TempDir() { fs::create_directories(path); }
     ~TempDir() { fs::remove_all(path); }
     std::string operator/(const std::string& name) const { return (path / name).string(); }
+    // A file of the folder holding `bytes` (a string or a byte vector); its path.
+    template <typename Bytes>
+    std::string write(const std::string& name, const Bytes& bytes) const {
+        std::ofstream(path / name, std::ios::binary)
+                .write(reinterpret_cast<const char*>(bytes.data()), bytes.size());
+        return *this / name;
+    }
 };
 
 }  // namespace testdata

@@ -109,7 +109,6 @@ TEST(DvbTeletext, DecodesArteAsLibzvbiDid) {
 }
 
 TEST(DvbTeletext, BuiltinPagesTravelToLibzvbiAndBack) {
-    size_t checked = 0;
     for (const Network& n : builtinBroadcast(1767290400).networks)
         for (const Transport& t : n.transports)
             for (const Service& s : t.services) {
@@ -133,7 +132,7 @@ TEST(DvbTeletext, BuiltinPagesTravelToLibzvbiAndBack) {
                 Zvbi zvbi(pes);
                 ASSERT_EQ(back.size(), sent.size());
                 ASSERT_EQ(zvbi.pages.size(), sent.size());
-                for (size_t i = 0; i < back.size(); ++i, ++checked) {
+                for (size_t i = 0; i < back.size(); ++i) {
                     const TeletextPage &a = sent[i], &b = back[i];
                     EXPECT_EQ(std::tie(a.number, a.subcode, a.controlBits, a.rows, a.links,
                                        a.charset),
@@ -143,12 +142,10 @@ TEST(DvbTeletext, BuiltinPagesTravelToLibzvbiAndBack) {
                               std::make_tuple(int(a.number), int(a.subcode), print(a)));
                 }
             }
-    EXPECT_GT(checked, 0u);
 }
 
-// The data units of one page: 0 its header, 1 its links, 2 its character set, 3.. rows 1..24;
-// in each, byte 3 the
-// framing code, bytes 4.. the packet (4, 5 the address, 6.. the page number or the text).
+// A page's data units: 0 its header, 1 its links, 2 its character set, 3.. rows 1..24; in each,
+// byte 3 the framing code, 4.. the packet (4, 5 the address, 6.. the page number or the text).
 TEST(DvbTeletext, KeepsWhatIsSoundOfDamagedUnits) {
     TeletextPage original = builtinBroadcast(0).networks[0].transports[0].services[0].teletext[0];
     original.charset = 0x15;
@@ -156,13 +153,10 @@ TEST(DvbTeletext, KeepsWhatIsSoundOfDamagedUnits) {
     pair[1].number = 0x1FF;
     const std::vector<uint8_t> pes = encodeTeletextPes(pair, 2, 0);
     auto unit = [](int u, int at) { return size_t(46 + 46 * u + at); };
-    struct Case {
-        size_t offset;
-        uint8_t mask;
-        size_t pages;
-        uint32_t pesDropped, unitsDropped, packetsDropped, parityErrors;
-        int row, col;  // what is lost: a row (col -1), a character, the links (25) or charset (26)
-    } cases[] = {
+    // The byte, the bits flipped; the pages decoded; PES, units and packets dropped, parity errors;
+    // what is lost: a row (col -1), a character, the links (row 25) or the character set (26).
+    using U = uint32_t;
+    const std::tuple<size_t, uint8_t, size_t, U, U, U, U, int, int> cases[] = {
             {unit(0, 4), 0x01, 1, 0, 0, 0, 0, -1, 0},  // one bit: corrected
             {unit(0, 4), 0x03, 0, 0, 0, 1, 0, -1, 0},  // the header's address
             {unit(0, 6), 0x0C, 0, 0, 0, 1, 0, -1, 0},  // its page number
@@ -174,30 +168,29 @@ TEST(DvbTeletext, KeepsWhatIsSoundOfDamagedUnits) {
             {45, 0x30, 0, 1, 0, 0, 0, -1, 0},          // the data identifier
             {3, 0x01, 0, 1, 0, 0, 0, -1, 0},           // the stream id
     };
-    for (const Case& c : cases) {
+    for (const auto& [at, mask, count, pesOut, unitsOut, packetsOut, parity, row, col] : cases) {
+        SCOPED_TRACE(at);
         std::vector<uint8_t> damaged = pes;
-        damaged[c.offset] ^= c.mask;
+        damaged[at] ^= mask;
         TeletextDecoder decoder;
         std::vector<TeletextPage> pages;
         decoder.feed(damaged.data(), damaged.size(), 0, pages);
         const TeletextStats& st = decoder.stats();
         EXPECT_EQ(std::tie(st.pesDropped, st.unitsDropped, st.packetsDropped, st.parityErrors),
-                  std::tie(c.pesDropped, c.unitsDropped, c.packetsDropped, c.parityErrors))
-                << c.offset;
-        ASSERT_EQ(pages.size(), c.pages) << c.offset;
-        if (!c.pages) continue;
+                  std::tie(pesOut, unitsOut, packetsOut, parity));
+        ASSERT_EQ(pages.size(), count);
+        if (!count) continue;
         TeletextPage want = original;
-        if (c.row == 26)
+        if (row == 26)
             want.charset = kNoCharset;
-        else if (c.row == 25)
+        else if (row == 25)
             want.links = {};
-        else if (c.row >= 0 && c.col < 0)
-            want.rows[c.row].fill(' ');
-        else if (c.row >= 0)
-            want.rows[c.row][c.col] = ' ';
+        else if (row >= 0 && col < 0)
+            want.rows[row].fill(' ');
+        else if (row >= 0)
+            want.rows[row][col] = ' ';
         EXPECT_EQ(std::tie(pages[0].rows, pages[0].links, pages[0].charset),
-                  std::tie(want.rows, want.links, want.charset))
-                << c.offset;
+                  std::tie(want.rows, want.links, want.charset));
     }
 }
 

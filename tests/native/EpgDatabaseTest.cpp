@@ -6,9 +6,9 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <filesystem>
-#include <fstream>
 #include <sstream>
+
+#include "Captures.h"
 
 namespace {
 
@@ -49,13 +49,6 @@ std::vector<int> ids(const std::vector<Event>& events) {
 
 class EpgDatabaseTest : public testing::Test {
 protected:
-    void SetUp() override {
-        dir_ = testing::TempDir() + "epgdb-XXXXXX";
-        ASSERT_NE(mkdtemp(dir_.data()), nullptr);
-        path_ = dir_ + "/epg.db";
-    }
-    void TearDown() override { std::filesystem::remove_all(dir_); }
-
     std::unique_ptr<EpgDatabase> open() {
         std::string error;
         auto db = EpgDatabase::open(path_, &error);
@@ -66,16 +59,14 @@ protected:
         return db.events(key, INT64_MIN, INT64_MAX);
     }
 
-    std::string dir_, path_;
+    testdata::TempDir dir_;
+    const std::string path_ = dir_ / "epg.db";
 };
 
 TEST_F(EpgDatabaseTest, ANewVersionReplacesOnlyItsOwnSectionAndAllSurvivesARestart) {
-    struct Step {
-        ServiceKey service;
-        uint8_t table, section, version;
-        std::vector<uint16_t> events;
-        std::vector<int> expected;  // the events of kSvc afterwards, by start
-    } const steps[] = {
+    // Service, table, section, version, the events stored; the events of kSvc afterwards, by start.
+    using Ids = std::vector<int>;
+    const std::tuple<ServiceKey, uint8_t, uint8_t, uint8_t, std::vector<uint16_t>, Ids> steps[] = {
             {kSvc, 0x50, 0, 1, {1, 2}, {1, 2}},
             {kSvc, 0x50, 8, 1, {3}, {1, 2, 3}},
             {kSvc, 0x50, 0, 2, {4}, {3, 4}},
@@ -88,25 +79,23 @@ TEST_F(EpgDatabaseTest, ANewVersionReplacesOnlyItsOwnSectionAndAllSurvivesAResta
     auto db = open();
     ASSERT_TRUE(db->addService({kSvc, 1, 2, 3}) && db->addService({kOther, 4, 5, 6}));
     ASSERT_TRUE(db->addService({kSvc, 7, 8, 9}));  // updated in its place
-    for (const Step& s : steps) {
-        if (&s == &steps[7]) db = open();
+    for (const auto& step : steps) {
+        const auto& [service, table, section, version, stored, expected] = step;
+        if (&step == &steps[7]) db = open();
         std::vector<Event> events;
-        for (size_t i = 0; i < s.events.size(); ++i) {
-            events.push_back(event(s.events[i], s.events[i] * 1000 + int64_t(i), 60, i * 999));
-        }
-        ASSERT_TRUE(db->storeSection(s.service, s.table, s.section, s.version, events))
-                << db->lastError();
-        EXPECT_EQ(ids(all(*db)), s.expected)
-                << "after section " << int(s.section) << " v" << int(s.version);
+        for (size_t i = 0; i < stored.size(); ++i)
+            events.push_back(event(stored[i], stored[i] * 1000 + int64_t(i), 60, i * 999));
+        ASSERT_TRUE(db->storeSection(service, table, section, version, events)) << db->lastError();
+        EXPECT_EQ(ids(all(*db)), expected)
+                << "after section " << int(section) << " v" << int(version);
     }
     EXPECT_EQ(dump(all(*db)),
               dump({event(4, 4000, 60, 0), event(5, 5000, 60, 0), event(7, 7000, 60, 0)}));
     EXPECT_EQ(dump(all(*db, kOther)), dump({event(6, 6000, 60, 0)}));
     std::string services;
-    for (const auto& v : db->services()) {
+    for (const auto& v : db->services())
         services += std::to_string(v.key.sid) + ":" + std::to_string(v.tpIndex) +
                     std::to_string(v.netIndex) + std::to_string(v.netType) + " ";
-    }
     EXPECT_EQ(services, "3:789 4:456 ");
     ASSERT_TRUE(db->clearServices());
     EXPECT_TRUE(open()->services().empty());
@@ -164,7 +153,7 @@ TEST_F(EpgDatabaseTest, AStoreKilledMidwayLeavesTheLastCommittedEvents) {
 TEST_F(EpgDatabaseTest, RefusesWhatItCannotOpenWithTheReason) {
     // Path, what the file holds (bytes, or what SQL made), the reason.
     const std::string cases[][4] = {
-            {dir_ + "/missing/epg.db", "", "", "unable to open database file"},
+            {dir_ / "missing/epg.db", "", "", "unable to open database file"},
             {path_, std::string(8192, 'Z'), "", "file is not a database"},
             {path_, "", "CREATE TABLE t (x)", "not an event database (it holds other tables)"},
             {path_, "", "PRAGMA user_version = 7", "not an event database (schema version 7)"},
@@ -173,9 +162,8 @@ TEST_F(EpgDatabaseTest, RefusesWhatItCannotOpenWithTheReason) {
         std::filesystem::remove(path_);
         if (!content.empty()) std::ofstream(path_, std::ios::binary) << content;
         sqlite3* raw = nullptr;
-        if (!statement.empty() && sqlite3_open(path_.c_str(), &raw) == SQLITE_OK) {
+        if (!statement.empty() && sqlite3_open(path_.c_str(), &raw) == SQLITE_OK)
             sqlite3_exec(raw, statement.c_str(), nullptr, nullptr, nullptr);
-        }
         sqlite3_close(raw);
         auto bytes = [&] {
             std::ifstream in(path_, std::ios::binary);

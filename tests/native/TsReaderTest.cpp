@@ -35,10 +35,9 @@ Loaded load(const std::string& setting) {
     Loaded l;
     std::string error;
     EXPECT_TRUE(loadBroadcast(setting, 0, l.b, error, &l.stats)) << error;
-    for (const Network& n : l.b.networks) {
+    for (const Network& n : l.b.networks)
         for (const Transport& t : n.transports)
             for (const Service& s : t.services) l.services[{t.onid, t.tsid, s.id}] = &s;
-    }
     return l;
 }
 
@@ -47,7 +46,10 @@ Loaded load(const std::string& setting) {
 TEST(TsReader, FrenchMultiplexMatchesItsTruth) {
     NEED_CAPTURE("fr-dvbt-multiplex-si.ts");
     const json t = truth("fr-dvbt-multiplex-si");
-    const Loaded l = load(kDir + "/fr-dvbt-multiplex-si.ts");
+    TempDir dir;
+    const std::string rel = fs::relative(kDir + "/fr-dvbt-multiplex-si.ts", dir.path);
+    const Loaded l = load(dir.write(
+            "fr.broadcast", "# the French multiplex R4\n" + rel + "  terrestrial 482000 7000\n"));
     EXPECT_EQ(l.b.start, utc(t["time"]["tdt_first_utc"]));
     EXPECT_EQ(l.b.loopMillis,
               1000 * (utc(t["time"]["tdt_last_utc"]) - utc(t["time"]["tdt_first_utc"])));
@@ -66,20 +68,17 @@ TEST(TsReader, FrenchMultiplexMatchesItsTruth) {
     }
     EXPECT_EQ(services, 46u);
 
-    // NIT: the network, its transports in order, their LCNs; every centre frequency is
-    // 0xFFFFFFFF, so the frequency rule tunes them (its test below).
+    // NIT: the network, its transports in order, their LCNs.
     const json& nit = t["nit"][0];
-    ASSERT_FALSE(l.b.networks.empty());
-    const Network& net = l.b.networks[0];
+    const Network& net = l.b.networks.at(0);
     EXPECT_EQ(net.id, nit["network_id"]);
     EXPECT_EQ(net.name, unhex(nit["network_name"]["hex"]));
     ASSERT_GE(net.transports.size(), nit["transport_streams"].size());
     for (size_t i = 0; i < nit["transport_streams"].size(); ++i) {
         const json& ts = nit["transport_streams"][i];
         const Transport& got = net.transports[i];
-        EXPECT_EQ(got.tsid, ts["tsid"]);
-        EXPECT_EQ(got.onid, ts["onid"]);
-        EXPECT_EQ(got.tuning.delivery, Delivery::Terrestrial);
+        EXPECT_EQ(std::make_tuple(int(got.tsid), int(got.onid), got.tuning.delivery),
+                  std::make_tuple(int(ts["tsid"]), int(ts["onid"]), Delivery::Terrestrial));
         for (const json& lcn : ts["lcn_0x83"]) {
             const auto key = std::make_tuple(int(ts["onid"]), int(ts["tsid"]), int(lcn["sid"]));
             if (l.services.count(key) == 0) continue;  // listed, but in no SDT
@@ -87,6 +86,16 @@ TEST(TsReader, FrenchMultiplexMatchesItsTruth) {
             EXPECT_EQ(l.services.at(key)->visible, lcn["visible"] == 1);
         }
     }
+
+    // Every centre frequency in the NIT is 0xFFFFFFFF: the file tunes tsid 4, the frequency rule
+    // the others, skipping 482000.
+    std::map<int, std::pair<uint32_t, uint32_t>> tunings,  // tsid: kHz, bandwidth
+            rule = {{1, {474000, 8000}},  {2, {490000, 8000}},  {3, {498000, 8000}},
+                    {4, {482000, 7000}},  {6, {506000, 8000}},  {8, {514000, 8000}},
+                    {10, {522000, 8000}}, {13, {530000, 8000}}, {15, {538000, 8000}}};
+    for (const Transport& tp : net.transports)
+        tunings[tp.tsid] = {tp.tuning.frequencyKHz, tp.tuning.bandwidthKHz};
+    EXPECT_EQ(tunings, rule);
 
     // EIT present/following and schedule: every event of every service, merged by event id.
     std::map<const Service*, std::set<int>> ids;
@@ -103,20 +112,17 @@ TEST(TsReader, FrenchMultiplexMatchesItsTruth) {
         EXPECT_EQ(decodeText(got->text), text) << e["event_id"];
         EXPECT_EQ(decodeText(got->extendedText), ext.empty() ? "" : ext.begin().value());
     };
-    for (const auto& [name, svc] : t["eit_pf"]["services"].items()) {
-        for (const char* part : {"present", "following"}) {
+    for (const auto& [name, svc] : t["eit_pf"]["services"].items())
+        for (const char* part : {"present", "following"})
             for (const json& e : svc.value(part, json::object()).value("events", json::array())) {
                 const json& se = e["short_events"][0];
                 check(svc, e, e["duration"]["seconds"], se["name"]["hex"], se["text"]["utf8"],
                       e.value("extended_text_concatenated", json::object()));
             }
-        }
-    }
     for (const auto& [name, svc] : t["eit_schedule"]["services"].items()) {
-        for (const json& e : svc["events"]) {
+        for (const json& e : svc["events"])
             check(svc, e, utc("1970-01-01T" + e["duration"].get<std::string>() + "Z"),
                   e["name_hex"], e["text_utf8"], e["extended_text_utf8"]);
-        }
         // The schedule's sections as received, each with the events it listed.
         std::set<std::pair<int, int>> want, got;
         for (const auto& [table, numbers] : svc["sections_seen"].items())
@@ -194,20 +200,16 @@ TEST(TsReader, DamagedCaptureKeepsWhatIsSoundAndCountsTheRest) {
 
 TEST(TsReader, SettingErrorsNameTheFileAndLine) {
     TempDir dir;
-    auto write = [&](const std::string& name, const std::string& text) {
-        std::ofstream(dir / name) << text;
-        return dir / name;
-    };
-    const std::string notTs = write("notes.ts", "Good grief, this is text\n");
+    const std::string notTs = dir.write("notes.ts", std::string("Good grief, this is text\n"));
     const std::string absent = dir / "absent.ts", x = dir / "x.ts", empty = dir / "empty";
     std::filesystem::create_directory(empty);
     std::vector<std::pair<std::string, std::string>> cases = {
             {notTs, notTs + ": not an MPEG transport stream"},
             {absent, absent + ": no such file or folder"},
             {empty, empty + ": folder holds no .ts capture"},
-            {write("x.broadcast", "x.ts   # a capture\n"), x + ": cannot read"},
+            {dir.write("x.broadcast", std::string("x.ts   # a capture\n")), x + ": cannot read"},
     };
-    const std::pair<const char*, const char*> files[] = {
+    const std::pair<std::string, const char*> files[] = {
             {"# nothing\n\n", ": lists no capture"},
             {"# c\nx.ts satellite 11494000 22000000\n", ":2: satellite needs a symbol rate"},
             {"x.ts terrestrial 586000 8000\ny.ts cable\n", ":2: 'cable' needs a frequency"},
@@ -220,7 +222,7 @@ TEST(TsReader, SettingErrorsNameTheFileAndLine) {
             {"x.ts terrestrial 586000 8000 9\n", ":1: too many fields"},
     };
     for (const auto& [text, error] : files) {
-        const std::string path = write(std::to_string(cases.size()) + ".broadcast", text);
+        const std::string path = dir.write(std::to_string(cases.size()) + ".broadcast", text);
         cases.push_back({path, path + error});
     }
     for (const auto& [setting, want] : cases) {
@@ -254,21 +256,4 @@ TEST(TsReader, BroadcastLinesGiveTheirTuning) {
         EXPECT_EQ(got.str(), want) << text;
         EXPECT_TRUE(line.tuned);
     }
-}
-
-TEST(TsReader, BroadcastFileTunesItsCaptureAndTheRuleTheRest) {
-    NEED_CAPTURE("fr-dvbt-multiplex-si.ts");
-    TempDir dir;
-    const std::string rel = fs::relative(kDir + "/fr-dvbt-multiplex-si.ts", dir.path);
-    std::ofstream(dir / "fr.broadcast") << "# the French multiplex R4\n"
-                                        << rel << "  terrestrial 482000 7000\n";
-    const Loaded l = load(dir / "fr.broadcast");
-    // The capture's own transport (tsid 4) takes the file's tuning; the rule skips 482000.
-    std::map<int, std::pair<uint32_t, uint32_t>> got,  // tsid: kHz, bandwidth
-            want = {{1, {474000, 8000}},  {2, {490000, 8000}},  {3, {498000, 8000}},
-                    {4, {482000, 7000}},  {6, {506000, 8000}},  {8, {514000, 8000}},
-                    {10, {522000, 8000}}, {13, {530000, 8000}}, {15, {538000, 8000}}};
-    for (const Transport& t : l.b.networks.at(0).transports)
-        got[t.tsid] = {t.tuning.frequencyKHz, t.tuning.bandwidthKHz};
-    EXPECT_EQ(got, want);
 }

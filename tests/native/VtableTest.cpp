@@ -57,8 +57,7 @@ TEST(Vtable, EveryModuleOperationKeepsItsPlace) {
                  S(GetVideoPos), S(SetWakeup));
     EXPECT_ORDER(Subttl, S(Init), S(Start), S(Stop), S(GetData));
     EXPECT_ORDER(Teltxt, S(Start), S(Stop), S(SetData), S(GetData));
-    EXPECT_EQ(Probe::first(), 2);
-    EXPECT_EQ(Probe::last(), 5);
+    EXPECT_EQ(std::make_pair(Probe::first(), Probe::last()), std::make_pair(2L, 5L));
     // DVBListener has RefBase as a virtual base: its own notify is its first slot.
     EXPECT_EQ(slotOf(&android::DVBListener::notify), 0);
 }
