@@ -349,7 +349,7 @@ TEST_F(ReceiverTest, AStreamPlaysWhatTheTransponderCarries) {
 TEST_F(ReceiverTest, TimeShiftPlaysNoFurtherThanItsFileHolds) {
     int32_t h;
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
-    rx->recordDir = dir;
+    rx->recordDir = dir.path;
     std::filesystem::create_symlink("/dev/full", rx->recordingPath(rx->streams.at(h), kStart));
     STRM_Settings s{};
     strm->GetSettings(h, &s);
@@ -368,8 +368,8 @@ TEST_F(ReceiverTest, TimeShiftPlaysNoFurtherThanItsFileHolds) {
 TEST_F(ReceiverTest, AFileBeingMadeHoldsOffASecondStartAndAStop) {
     int32_t h;
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
-    rx->recordDir = dir;
-    const std::string dump = dir + "/dump", other = dir + "/other.ts";
+    rx->recordDir = dir.path;
+    const std::string dump = dir / "dump", other = dir / "other.ts";
     STRM_Settings shift{}, live{};
     strm->GetSettings(h, &shift);
     shift.playSpeed = shift.playSpeedDiv = 1;
