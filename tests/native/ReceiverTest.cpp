@@ -344,35 +344,17 @@ TEST_F(ReceiverTest, AStreamPlaysWhatTheTransponderCarries) {
               std::make_tuple(kPvrActive, 20, kPvrPaused, 5));
 }
 
-// The disk fills up under time shift: the file keeps what it holds, and play back goes no
-// further than that.
-TEST_F(ReceiverTest, TimeShiftPlaysNoFurtherThanItsFileHolds) {
-    int32_t h;
-    ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
-    rx->recordDir = dir.path;
-    std::filesystem::create_symlink("/dev/full", rx->recordingPath(rx->streams.at(h), kStart));
-    STRM_Settings s{};
-    strm->GetSettings(h, &s);
-    s.playSpeed = 2, s.playSpeedDiv = 1, s.posTime = 0;
-    ASSERT_EQ(strm->SetSettings(h, &s), kOk);
-    advance(10000);
-    STRM_GetStatus st{};
-    strm->GetStatus(h, &st);
-    EXPECT_EQ(std::make_tuple(st.recduration, st.recsize, st.pbstate, st.pbposition),
-              std::make_tuple(0, 0, kPvrTrick, 0));
-}
-
 // A time shift or a dump still making its file (a FIFO opens once it is read) holds off a
 // second start, which makes no file (a second later, its own name), and a stop, which may try
-// again.
-TEST_F(ReceiverTest, AFileBeingMadeHoldsOffASecondStartAndAStop) {
+// again. A time shift whose disk is full plays back no further than its file holds.
+TEST_F(ReceiverTest, FilesBeingMadeHoldOffASecondStartAndAStopAndAFullOneHoldsPlayBack) {
     int32_t h;
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
     rx->recordDir = dir.path;
     const std::string dump = dir / "dump", other = dir / "other.ts";
     STRM_Settings shift{}, live{};
     strm->GetSettings(h, &shift);
-    shift.playSpeed = shift.playSpeedDiv = 1;
+    shift.playSpeed = 2, shift.playSpeedDiv = 1;
     const Stream& stream = rx->streams.at(h);
     const struct {
         std::string fifo, other;
@@ -407,6 +389,13 @@ TEST_F(ReceiverTest, AFileBeingMadeHoldsOffASecondStartAndAStop) {
         drain.join();
         close(fd);
     }
+    std::filesystem::create_symlink("/dev/full", rx->recordingPath(stream, kStart + 2000));
+    ASSERT_EQ(strm->SetSettings(h, &shift), kOk);
+    advance(10000);
+    STRM_GetStatus st{};
+    strm->GetStatus(h, &st);
+    EXPECT_EQ(std::make_tuple(st.recduration, st.recsize, st.pbstate, st.pbposition),
+              std::make_tuple(0, 0, kPvrTrick, 0));
 }
 
 TEST_F(ReceiverTest, BadInputGetsItsResult) {
