@@ -399,9 +399,13 @@ const dvbmodel::Service* Receiver::findService(uint16_t onid, uint16_t tsid, uin
 }
 
 int32_t Receiver::newHandle() {
-    int32_t h = nextHandle;
-    // Handles are never reused while the process runs, so a closed one stays unknown.
-    nextHandle = nextHandle == INT32_MAX ? 1 : nextHandle + 1;
+    // Handles are not reused, so a closed one stays unknown; a count gone round past INT32_MAX
+    // skips those still open (at most 16 of each kind, so the loop ends).
+    int32_t h;
+    do {
+        h = nextHandle;
+        nextHandle = nextHandle == INT32_MAX ? 1 : nextHandle + 1;
+    } while (scans.count(h) + streams.count(h) + subtitles.count(h) + teletexts.count(h) != 0);
     return h;
 }
 

@@ -512,6 +512,8 @@ TEST_F(ReceiverTest, BadInputGetsItsResult) {
             {"dump to no folder",
              [&] { return cfg->TSDumpStart(0, 0, 0, "/nonexistent/dir/dump.ts"); }, kErrPath},
             {"volume 101", [&] { return cfg->SetAudioVolume(101); }, kErrBadParameter},
+            {"handles counted round to one open",
+             [&] { return rx->nextHandle = tt, teltxt->Start(&txt); }, tt + 1},
             {"stream closed", [&] { return strm->Close(h) | strm->GetStatus(h, &st); },
              kErrBadHandle},
             {"teletext ended with its stream", [&] { return teltxt->Stop(tt); }, kErrBadHandle},
