@@ -203,7 +203,9 @@ void Receiver::collectDecoderEvents(int64_t now, std::vector<std::array<int, 3>>
 int32_t ReceiverSubttl::Start(const SUBTTL_Settings* settings) {
     std::lock_guard<std::mutex> lock(mRx->mLock);
     if (settings == nullptr) return kErrBadParameter;
-    // hstrm names the stream whose subtitle component the decoder takes.
+    // hstrm names the stream whose subtitle component the decoder takes; one past INT32_MAX
+    // names none (it would read as negative, which means any stream).
+    if (settings->hstrm > INT32_MAX) return kErrBadHandle;
     int32_t stream = streamWith(*mRx, dvbmodel::Kind::Subtitle, settings->pid,
                                 static_cast<int32_t>(settings->hstrm));
     if (stream < 0) return stream;

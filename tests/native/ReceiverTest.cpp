@@ -512,6 +512,13 @@ TEST_F(ReceiverTest, BadInputGetsItsResult) {
             {"dump to no folder",
              [&] { return cfg->TSDumpStart(0, 0, 0, "/nonexistent/dir/dump.ts"); }, kErrPath},
             {"volume 101", [&] { return cfg->SetAudioVolume(101); }, kErrBadParameter},
+            {"subtitles of stream 2^31 + h",
+             [&] {
+                 SUBTTL_Settings sub{};
+                 sub.pid = 0x205, sub.hstrm = 0x80000000u | static_cast<uint32_t>(h);
+                 return subttl->Start(&sub);
+             },
+             kErrBadHandle},
             {"handles counted round to one open",
              [&] { return rx->nextHandle = tt, teltxt->Start(&txt); }, tt + 1},
             {"stream closed", [&] { return strm->Close(h) | strm->GetStatus(h, &st); },
