@@ -218,7 +218,7 @@ int32_t ReceiverStrm::SetSettings(int32_t handle, const STRM_Settings* settings)
     if (it != mRx->streams.end()) it->second.shiftOpening = false;
     if (it == mRx->streams.end() || !it->second.started || it->second.service != service) {
         // Closed, stopped or retuned meanwhile: the file is not wanted.
-        stop.write.recording = std::move(recording);
+        stop.recording = std::move(recording);
         stop.discard = true;
         return it == mRx->streams.end() ? kErrBadHandle : kErrNotStarted;
     }
@@ -240,7 +240,8 @@ void ReceiverStrm::shift(Stream& s, const STRM_Settings& settings, int64_t now) 
 
 void ReceiverStrm::stopRecording(Stream& s, RecordingStop& stop) {
     if (!s.recording) return;
-    stop.write = mRx->recordingWrite(std::move(s.recording), s, mRx->clock().nowMillis());
+    mRx->planRecording(*s.recording, s, mRx->clock().nowMillis());
+    stop.recording = std::move(s.recording);
     s.recording.reset();
 }
 

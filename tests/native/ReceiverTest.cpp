@@ -16,6 +16,7 @@
 #include <cstring>
 #include <filesystem>
 #include <fstream>
+#include <future>
 #include <mutex>
 #include <set>
 #include <thread>
@@ -471,6 +472,32 @@ TEST_F(ReceiverTest, AFileBeingMadeHoldsOffASecondStartAndAStop) {
         drain.join();
         close(fd);
     }
+}
+
+// A retune that the service thread has not looked at yet (it is held meanwhile) leaves the
+// time shift and the dump on that front end what they received before it.
+TEST_F(ReceiverTest, ARetuneKeepsWhatRecordingsReceivedBeforeIt) {
+    int32_t h;
+    ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
+    rx->recordDir = dir;
+    STRM_Settings shift{};
+    strm->GetSettings(h, &shift);
+    shift.playSpeed = shift.playSpeedDiv = 1;
+    const std::string dump = dir + "/dump.ts";
+    ASSERT_EQ(strm->SetSettings(h, &shift) | cfg->TSDumpStart(0, 0, 0, dump.c_str()), kOk);
+    std::promise<void> go;
+    std::shared_future<void> held = go.get_future().share();
+    rx->post([held] { held.wait(); });
+    rx->clock().advance(5000);
+    P other = sat(11493750, 0);
+    ASSERT_EQ(cfg->Tune(0, &other), kOk);
+    go.set_value();
+    rx->sync();
+    STRM_GetStatus st{};
+    strm->GetStatus(h, &st);
+    EXPECT_EQ(cfg->TSDumpStop(), kOk);
+    EXPECT_GT(st.recsize, 0);
+    EXPECT_GT(std::filesystem::file_size(dump), 0u);
 }
 
 TEST_F(ReceiverTest, BadInputGetsItsResult) {
