@@ -209,7 +209,14 @@ int32_t ReceiverStrm::SetSettings(int32_t handle, const STRM_Settings* settings)
         since = now;
         service = s.service;
         path = mRx->recordingPath(s, now);
+        // Another stream's time shift of this service from this second has (or is making)
+        // this file: a second one would truncate it.
+        for (const auto& [oh, o] : mRx->streams) {
+            if ((o.recording || o.shiftOpening) && mRx->recordingPath(o, o.shiftSince) == path)
+                return kErrBusy;
+        }
         s.shiftOpening = true;
+        s.shiftSince = since;
     }
     std::shared_ptr<Recording> recording =
             Recording::create(path, mRx->broadcast(), service, since);

@@ -474,9 +474,10 @@ TEST_F(ReceiverTest, AFileBeingMadeHoldsOffASecondStartAndAStop) {
     }
 }
 
-// A retune that the service thread has not looked at yet (it is held meanwhile) leaves the
-// time shift and the dump on that front end what they received before it.
-TEST_F(ReceiverTest, ARetuneKeepsWhatRecordingsReceivedBeforeIt) {
+// A time shift keeps its file to itself, and a retune that the service thread has not looked
+// at yet (it is held meanwhile) leaves the time shift and the dump on that front end what they
+// received before it.
+TEST_F(ReceiverTest, RecordingsKeepTheirFileAndWhatTheyReceivedBeforeARetune) {
     int32_t h;
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
     rx->recordDir = dir;
@@ -485,6 +486,9 @@ TEST_F(ReceiverTest, ARetuneKeepsWhatRecordingsReceivedBeforeIt) {
     shift.playSpeed = shift.playSpeedDiv = 1;
     const std::string dump = dir + "/dump.ts";
     ASSERT_EQ(strm->SetSettings(h, &shift) | cfg->TSDumpStart(0, 0, 0, dump.c_str()), kOk);
+    int32_t same;  // a second stream of the service, in the same second: its file would be h's
+    ASSERT_EQ(startStream(sat(12551500, 1), 28006, &same), kOk);
+    EXPECT_EQ(strm->SetSettings(same, &shift), kErrBusy);
     std::promise<void> go;
     std::shared_future<void> held = go.get_future().share();
     rx->post([held] { held.wait(); });
