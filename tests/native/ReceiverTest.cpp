@@ -861,4 +861,34 @@ TEST_F(DecodersTest, NavigationFollowsTheLinksOrThePagesPresent) {
     }
 }
 
+// A file played back from mid-second shows each display set at its time from the stream's
+// start (not from the whole second before it).
+TEST_F(DecodersTest, PlaybackShowsDisplaySetsAtTheirTimesFromItsStart) {
+    std::string dir = ::testing::TempDir() + "playback-XXXXXX";
+    ASSERT_NE(mkdtemp(dir.data()), nullptr);
+    rx->recordDir = dir;
+    STRM_Settings s{};
+    strm->GetSettings(stream, &s);
+    s.playSpeed = s.playSpeedDiv = 1;
+    ASSERT_EQ(strm->SetSettings(stream, &s), kOk);
+    STRM_OpenSettings back{};
+    snprintf(back.szPath, sizeof back.szPath, "%s",
+             rx->streams.at(stream).recording->path().c_str());
+    advance(6000);
+    ASSERT_EQ(strm->Stop(stream, 0), kOk);
+    int32_t p = strm->Open(&back);
+    advance(700);
+    ASSERT_EQ(strm->Start(p, &s), kOk);
+    SUBTTL_Settings sub{};
+    sub.pid = 0x105, sub.compositionPageId = sub.ancillaryPageId = 1, sub.hstrm = p;
+    int32_t h = subttl->Start(&sub);
+    std::vector<uint8_t> data(sizeof(SUBTTL_Data));
+    advance(rx->streams.at(p).service->subtitles.at(0).time);
+    ASSERT_EQ(subttl->GetData(h, data.data()), kOk);
+    STRM_GetStatus st{};
+    strm->GetStatus(p, &st);
+    // Sent just now: its PTS is the stream's.
+    EXPECT_EQ(reinterpret_cast<SUBTTL_Data*>(data.data())->i_pts, st.localPts);
+    std::filesystem::remove_all(dir);
+}
 }  // namespace
