@@ -389,7 +389,8 @@ private:
     int64_t firstUtc_ = 0, lastUtc_ = 0;
     int pcrPid_ = -1, ptsPid_ = -1;
     uint64_t firstPcr_ = 0, lastPcr_ = 0, pcrSpan_ = 0;  // 90 kHz
-    uint64_t firstPts_ = 0, minPts_ = 0, maxPts_ = 0;
+    uint64_t firstPts_ = 0;
+    int64_t minPts_ = 0, maxPts_ = 0;  // from firstPts_, round the 33-bit wrap
 };
 
 void Reader::onPat(void* data, dvbpsi_pat_t* pat) {
@@ -716,8 +717,13 @@ void Reader::timing(const uint8_t* p, uint16_t pid, bool payload, bool start, si
     }
     if ((pes[7] & 0x80) == 0) return;
     const uint64_t pts = readPts(pes + 9);
-    if (ptsPid_ < 0) ptsPid_ = pid, firstPts_ = minPts_ = maxPts_ = pts;
-    if (pid == ptsPid_) minPts_ = std::min(minPts_, pts), maxPts_ = std::max(maxPts_, pts);
+    if (ptsPid_ < 0) ptsPid_ = pid, firstPts_ = pts;
+    if (pid != ptsPid_) return;
+    // Counted from the first PTS, either way round the wrap (frames come out of order), so that
+    // a capture across the wrap lasts what it holds, not 26 hours.
+    int64_t at = int64_t((pts - firstPts_) & (kPts33 - 1));
+    if (at >= int64_t(kPts33 / 2)) at -= int64_t(kPts33);
+    minPts_ = std::min(minPts_, at), maxPts_ = std::max(maxPts_, at);
 }
 
 // A packet that unread() did not skip.

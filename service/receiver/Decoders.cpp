@@ -59,13 +59,16 @@ struct Sent {
     Sending sending;
 };
 
-// The item of a timed list of the model (in time order, times in ms from the loop's start)
-// that was sent last by `now` (UTC ms) among those `keep` accepts; the list repeats with the
-// broadcast's loop, before its start as after.
+// The item of a timed list of stream `s`'s service (in time order, times in ms from the loop's
+// start) that was sent last by `now` (UTC ms) among those `keep` accepts; the list repeats with
+// the broadcast's loop, before its start as after.
 template <typename T, typename Keep>
-Sent<T> lastSent(const std::vector<T>& items, const dvbmodel::Broadcast& b, int64_t now,
+Sent<T> lastSent(const Receiver& rx, const Stream& s, const std::vector<T>& items, int64_t now,
                  Keep keep) {
-    int64_t origin = b.start * 1000;
+    const dvbmodel::Broadcast& b = rx.broadcastOf(s);
+    // A file plays from the very millisecond its stream started, which its broadcast's start
+    // (whole seconds) does not tell.
+    int64_t origin = s.playback ? s.startedAt : b.start * 1000;
     if (b.loopMillis > 0) origin += floorDiv(now - origin, b.loopMillis) * b.loopMillis;
     for (int loop = 0; loop < 2; ++loop) {
         for (size_t i = items.size(); i-- > 0;) {
@@ -82,9 +85,9 @@ Sent<T> lastSent(const std::vector<T>& items, const dvbmodel::Broadcast& b, int6
 Sent<dvbmodel::DisplaySet> currentSet(const Receiver& rx, const Stream& s, const Decoder& d,
                                       int64_t now, int64_t* from) {
     if (!rx.decoding(s, now, from)) return {};
-    return lastSent(
-            s.service->subtitles, rx.broadcastOf(s), now,
-            [&](const dvbmodel::DisplaySet& set) { return set.pageId == d.compositionPageId; });
+    return lastSent(rx, s, s.service->subtitles, now, [&](const dvbmodel::DisplaySet& set) {
+        return set.pageId == d.compositionPageId;
+    });
 }
 
 bool selected(const Decoder& d, const dvbmodel::TeletextPage& p) {
@@ -95,7 +98,7 @@ Sent<dvbmodel::TeletextPage> currentPage(const Receiver& rx, const Stream& s, co
                                          int64_t now) {
     int64_t from;
     if (!rx.decoding(s, now, &from)) return {};
-    return lastSent(s.service->teletext, rx.broadcastOf(s), now,
+    return lastSent(rx, s, s.service->teletext, now,
                     [&](const dvbmodel::TeletextPage& p) { return selected(d, p); });
 }
 
@@ -203,7 +206,9 @@ void Receiver::collectDecoderEvents(int64_t now, std::vector<std::array<int, 3>>
 int32_t ReceiverSubttl::Start(const SUBTTL_Settings* settings) {
     std::lock_guard<std::mutex> lock(mRx->mLock);
     if (settings == nullptr) return kErrBadParameter;
-    // hstrm names the stream whose subtitle component the decoder takes.
+    // hstrm names the stream whose subtitle component the decoder takes; one past INT32_MAX
+    // names none (it would read as negative, which means any stream).
+    if (settings->hstrm > INT32_MAX) return kErrBadHandle;
     int32_t stream = streamWith(*mRx, dvbmodel::Kind::Subtitle, settings->pid,
                                 static_cast<int32_t>(settings->hstrm));
     if (stream < 0) return stream;

@@ -201,14 +201,15 @@ void Receiver::run() {
         int64_t now = mClock.nowMillis();
         auto events = collectEvents(now);
         // Recordings and the dump catch up with the clock, written outside the lock.
-        std::vector<RecordingWrite> writes;
+        planWrites(now);
+        std::vector<std::shared_ptr<Recording>> writes;
         for (const auto& [h, s] : streams) {
-            if (s.recording) writes.push_back(recordingWrite(s.recording, s, now));
+            if (s.recording) writes.push_back(s.recording);
         }
-        if (outputs.dump) writes.push_back(dumpWrite(now));
+        if (outputs.dump) writes.push_back(outputs.dump);
         lock.unlock();
         for (const auto& e : events) mSink(e[0], e[1], e[2]);
-        for (const auto& w : writes) w.recording->writeUntil(w.until, w.network, w.transport);
+        for (const auto& w : writes) w->catchUp();
         lock.lock();
         // Caught up only once the tasks that tasks posted have run too.
         if (mTasks.empty()) {
@@ -314,21 +315,25 @@ std::string Receiver::recordingPath(const Stream& s, int64_t ms) const {
            std::to_string(ms / 1000) + ".ts";
 }
 
-RecordingWrite Receiver::recordingWrite(std::shared_ptr<Recording> r, const Stream& s,
-                                        int64_t now) const {
-    RecordingWrite w{std::move(r), nullptr, nullptr, now};
+void Receiver::planRecording(Recording& r, const Stream& s, int64_t now) const {
     int64_t from = 0;
-    if (s.started && decoding(s, now, &from)) w.network = s.network, w.transport = s.transport;
-    return w;
+    bool on = s.started && decoding(s, now, &from);
+    r.plan(now, on ? s.network : nullptr, on ? s.transport : nullptr);
 }
 
-RecordingWrite Receiver::dumpWrite(int64_t now) const {
-    RecordingWrite w{outputs.dump, nullptr, nullptr, now};
+void Receiver::planDump(int64_t now) const {
     const Frontend& fe = frontends[outputs.dumpFrontend];
-    if (!fe.tuned) return w;
-    Signal sig = signal(fe.params, fe.tunedAt, now);
-    if ((sig.status & kFeLock) != 0) w.network = sig.network, w.transport = sig.transport;
-    return w;
+    Signal sig;
+    if (fe.tuned) sig = signal(fe.params, fe.tunedAt, now);
+    bool locked = (sig.status & kFeLock) != 0;
+    outputs.dump->plan(now, locked ? sig.network : nullptr, locked ? sig.transport : nullptr);
+}
+
+void Receiver::planWrites(int64_t now) const {
+    for (const auto& [h, s] : streams) {
+        if (s.recording) planRecording(*s.recording, s, now);
+    }
+    if (outputs.dump) planDump(now);
 }
 
 int64_t Receiver::toleranceKHz(dvbmodel::Delivery d) {
@@ -371,7 +376,15 @@ bool Receiver::plausible(const ANT_FrontendParameters& p) {
     }
 }
 
+void Receiver::moveDish(double target) {
+    int64_t now = mClock.nowMillis();
+    planWrites(now);
+    dish.moveTo(target, now);
+}
+
 void Receiver::tune(int32_t dev, const ANT_FrontendParameters& params) {
+    // What recordings received up to now is theirs, whenever the service thread writes it.
+    planWrites(mClock.nowMillis());
     Frontend& fe = frontends[dev];
     if (params.myLongitude != 0 || params.myLatitude != 0) {
         site = {params.myLongitude / 10.0, params.myLatitude / 10.0};
@@ -399,9 +412,13 @@ const dvbmodel::Service* Receiver::findService(uint16_t onid, uint16_t tsid, uin
 }
 
 int32_t Receiver::newHandle() {
-    int32_t h = nextHandle;
-    // Handles are never reused while the process runs, so a closed one stays unknown.
-    nextHandle = nextHandle == INT32_MAX ? 1 : nextHandle + 1;
+    // Handles are not reused, so a closed one stays unknown; a count gone round past INT32_MAX
+    // skips those still open (at most 16 of each kind, so the loop ends).
+    int32_t h;
+    do {
+        h = nextHandle;
+        nextHandle = nextHandle == INT32_MAX ? 1 : nextHandle + 1;
+    } while (scans.count(h) + streams.count(h) + subtitles.count(h) + teletexts.count(h) != 0);
     return h;
 }
 

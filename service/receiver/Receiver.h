@@ -176,27 +176,17 @@ struct Outputs {
     std::shared_ptr<Recording> dump;
 };
 
-// A piece of writing for a recording or dump: what is on the air for it up to `until`, decided
-// under the receiver's lock and written outside it.
-struct RecordingWrite {
-    std::shared_ptr<Recording> recording;
-    const dvbmodel::Network* network = nullptr;
-    const dvbmodel::Transport* transport = nullptr;  // null: nothing on the air
-    int64_t until = 0;
-};
-
 // Finishes a recording as it goes out of scope: declared before the receiver's lock is taken,
-// it closes the file after the lock is released.
+// it closes the file (planned up to the stop under the lock) after the lock is released.
 struct RecordingStop {
-    RecordingWrite write;
+    std::shared_ptr<Recording> recording;
     bool discard = false;  // the file is not wanted: closed and removed
     RecordingStop() = default;
     RecordingStop(const RecordingStop&) = delete;
     RecordingStop& operator=(const RecordingStop&) = delete;
     ~RecordingStop() {
-        if (write.recording && discard) write.recording->discard();
-        if (write.recording && !discard)
-            write.recording->finish(write.until, write.network, write.transport);
+        if (recording && discard) recording->discard();
+        if (recording && !discard) recording->finish();
     }
 };
 
@@ -267,6 +257,8 @@ public:
     // and the demodulator's capture range; a cable QAM and a terrestrial OFDM demodulator's.
     static int64_t toleranceKHz(dvbmodel::Delivery d);
 
+    // Moves the dish to `target` (Dish::moveTo), once recordings have what they received.
+    void moveDish(double target);
     // Tunes front end `dev` (valid) to `params`: the same tuning again keeps its lock.
     void tune(int32_t dev, const ANT_FrontendParameters& params);
     // The service with these identifiers, and its transponder; null when the model has none.
@@ -290,10 +282,12 @@ public:
     // The file of a recording of stream `s` that starts at `ms`:
     // <recordDir>/rec-<onid>-<tsid>-<sid>-<UTC seconds>.ts.
     std::string recordingPath(const Stream& s, int64_t ms) const;
-    // What recording `r` of stream `s` gets up to `now`: the stream's service while it decodes.
-    RecordingWrite recordingWrite(std::shared_ptr<Recording> r, const Stream& s, int64_t now) const;
-    // What the dump gets up to `now`: the transponder its front end is locked on.
-    RecordingWrite dumpWrite(int64_t now) const;
+    // Plans recording `r` of stream `s` up to `now`: the stream's service while it decodes.
+    void planRecording(Recording& r, const Stream& s, int64_t now) const;
+    // Plans the dump up to `now`: the transponder its front end is locked on.
+    void planDump(int64_t now) const;
+    // Plans every recording and the dump up to `now`, before a change of what they receive.
+    void planWrites(int64_t now) const;
 
     // ---- event database (ReceiverEpg.cpp), on the service thread ----------------------
     // Opens the database at `path` (an open one at the same path stays), takes the services

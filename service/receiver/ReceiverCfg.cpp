@@ -43,7 +43,7 @@ int32_t ReceiverCfg::GetStatus(int32_t dev, ANT_Status* status) {
 int32_t ReceiverCfg::Reset(int32_t dev) {
     std::lock_guard<std::mutex> lock(mRx->mLock);
     if (!mRx->validFrontend(dev)) return kErrBadParameter;
-    mRx->dish.moveTo(0.0, mRx->clock().nowMillis());
+    mRx->moveDish(0.0);
     return kOk;
 }
 
@@ -52,7 +52,7 @@ int32_t ReceiverCfg::GotoPosition(int32_t dev, uint8_t position) {
     if (!mRx->validFrontend(dev)) return kErrBadParameter;
     Dish& dish = mRx->dish;
     if (position != 0 && !dish.isStored[position]) return kErrBadParameter;
-    dish.moveTo(position == 0 ? 0.0 : dish.stored[position], mRx->clock().nowMillis());
+    mRx->moveDish(position == 0 ? 0.0 : dish.stored[position]);
     return kOk;
 }
 
@@ -88,13 +88,13 @@ int32_t ReceiverCfg::Drive(int32_t dev, uint8_t direction, uint8_t mode, uint8_t
     double here = dish.at(now);
     switch (mode) {
         case 0:
-            dish.moveTo(sign * kMotorTravel, now);
+            mRx->moveDish(sign * kMotorTravel);
             break;
         case 1:
-            dish.moveTo(here + sign * value * kMotorDegreesPerSecond, now);
+            mRx->moveDish(here + sign * value * kMotorDegreesPerSecond);
             break;
         case 2:
-            dish.moveTo(here + sign * value * 0.1, now);
+            mRx->moveDish(here + sign * value * 0.1);
             break;
         default:
             return kErrBadParameter;
@@ -106,7 +106,7 @@ int32_t ReceiverCfg::Stop(int32_t dev) {
     std::lock_guard<std::mutex> lock(mRx->mLock);
     if (!mRx->validFrontend(dev)) return kErrBadParameter;
     int64_t now = mRx->clock().nowMillis();
-    mRx->dish.moveTo(mRx->dish.at(now), now);
+    mRx->moveDish(mRx->dish.at(now));
     return kOk;
 }
 
@@ -142,8 +142,8 @@ int32_t ReceiverCfg::GotoSatellite(int32_t dev, int16_t satLongitude, int16_t my
     Site site{myLongitude / 10.0, myLatitude / 10.0};
     double angle = usalsAngle(satLongitude / 10.0, site);
     if (std::isnan(angle) || std::fabs(angle) > kMotorTravel) return kErrBadParameter;
+    mRx->moveDish(angle);
     mRx->site = site;
-    mRx->dish.moveTo(angle, mRx->clock().nowMillis());
     return kOk;
 }
 
@@ -209,6 +209,8 @@ int32_t ReceiverCfg::CaGetStatus(int32_t dev, int32_t* source, int32_t* lastCwSe
 int32_t ReceiverCfg::CaStandby(int32_t state) {
     std::lock_guard<std::mutex> lock(mRx->mLock);
     if (state < 0 || state > 1) return kErrBadParameter;
+    // What recordings of scrambled services received up to now is theirs.
+    mRx->planWrites(mRx->clock().nowMillis());
     mRx->outputs.caStandby = state == 1;
     return kOk;
 }
@@ -273,7 +275,8 @@ int32_t ReceiverCfg::TSDumpStop() {
     if (!mRx->outputs.dumping) return kErrNotStarted;
     mRx->outputs.dumping = false;
     // The file gets the packets up to now and is closed once the lock is released.
-    stop.write = mRx->dumpWrite(mRx->clock().nowMillis());
+    mRx->planDump(mRx->clock().nowMillis());
+    stop.recording = std::move(mRx->outputs.dump);
     mRx->outputs.dump.reset();
     return kOk;
 }

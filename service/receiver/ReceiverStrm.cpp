@@ -209,7 +209,14 @@ int32_t ReceiverStrm::SetSettings(int32_t handle, const STRM_Settings* settings)
         since = now;
         service = s.service;
         path = mRx->recordingPath(s, now);
+        // Another stream's time shift of this service from this second has (or is making)
+        // this file: a second one would truncate it.
+        for (const auto& [oh, o] : mRx->streams) {
+            if ((o.recording || o.shiftOpening) && mRx->recordingPath(o, o.shiftSince) == path)
+                return kErrBusy;
+        }
         s.shiftOpening = true;
+        s.shiftSince = since;
     }
     std::shared_ptr<Recording> recording =
             Recording::create(path, mRx->broadcast(), service, since);
@@ -218,7 +225,7 @@ int32_t ReceiverStrm::SetSettings(int32_t handle, const STRM_Settings* settings)
     if (it != mRx->streams.end()) it->second.shiftOpening = false;
     if (it == mRx->streams.end() || !it->second.started || it->second.service != service) {
         // Closed, stopped or retuned meanwhile: the file is not wanted.
-        stop.write.recording = std::move(recording);
+        stop.recording = std::move(recording);
         stop.discard = true;
         return it == mRx->streams.end() ? kErrBadHandle : kErrNotStarted;
     }
@@ -240,7 +247,8 @@ void ReceiverStrm::shift(Stream& s, const STRM_Settings& settings, int64_t now) 
 
 void ReceiverStrm::stopRecording(Stream& s, RecordingStop& stop) {
     if (!s.recording) return;
-    stop.write = mRx->recordingWrite(std::move(s.recording), s, mRx->clock().nowMillis());
+    mRx->planRecording(*s.recording, s, mRx->clock().nowMillis());
+    stop.recording = std::move(s.recording);
     s.recording.reset();
 }
 

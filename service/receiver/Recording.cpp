@@ -50,17 +50,32 @@ Recording::~Recording() {
     if (mFd >= 0) ::close(mFd);
 }
 
-void Recording::writeUntil(int64_t untilMs, const dvbmodel::Network* network,
-                           const dvbmodel::Transport* transport) {
+void Recording::plan(int64_t untilMs, const dvbmodel::Network* network,
+                     const dvbmodel::Transport* transport) {
+    std::lock_guard<std::mutex> lock(mPlanLock);
+    mPlans.push_back({untilMs, network, transport});
+}
+
+void Recording::catchUp() {
     std::lock_guard<std::mutex> lock(mLock);
+    std::vector<Plan> plans;
+    {
+        // Taken under mLock: a second writer waits, then writes the plans made after these.
+        std::lock_guard<std::mutex> planLock(mPlanLock);
+        plans.swap(mPlans);
+    }
+    for (const Plan& p : plans) write(p);
+}
+
+void Recording::write(const Plan& plan) {
     dvbmodel::TsWriterOptions options;
     options.only = mOnly;
-    for (int64_t at = mWritten.load(); at < untilMs && mFd >= 0 && !mFailed;) {
-        int64_t span = std::min(kPieceMillis, untilMs - at);
-        if (transport != nullptr && network != nullptr) {
+    for (int64_t at = mWritten.load(); at < plan.until && mFd >= 0 && !mFailed;) {
+        int64_t span = std::min(kPieceMillis, plan.until - at);
+        if (plan.transport != nullptr && plan.network != nullptr) {
             mBuffer.clear();
-            dvbmodel::writeTransport(mBroadcast, *network, *transport, at, span, mBuffer, mState,
-                                     options);
+            dvbmodel::writeTransport(mBroadcast, *plan.network, *plan.transport, at, span, mBuffer,
+                                     mState, options);
             if (!writeAll(mFd, mBuffer.data(), mBuffer.size())) {
                 mFailed = true;
                 break;
@@ -72,9 +87,8 @@ void Recording::writeUntil(int64_t untilMs, const dvbmodel::Network* network,
     }
 }
 
-void Recording::finish(int64_t untilMs, const dvbmodel::Network* network,
-                       const dvbmodel::Transport* transport) {
-    writeUntil(untilMs, network, transport);
+void Recording::finish() {
+    catchUp();
     std::lock_guard<std::mutex> lock(mLock);
     if (mFd >= 0) ::close(mFd);
     mFd = -1;

@@ -29,13 +29,16 @@ public:
     Recording(const Recording&) = delete;
     Recording& operator=(const Recording&) = delete;
 
-    // Writes the stream from where it stopped up to UTC `untilMs`, from `transport` (of
-    // `network`); a null transport lets the span pass without packets (no signal).
-    void writeUntil(int64_t untilMs, const dvbmodel::Network* network,
-                    const dvbmodel::Transport* transport);
-    // writeUntil, then closes the file; later writes do nothing.
-    void finish(int64_t untilMs, const dvbmodel::Network* network,
-                const dvbmodel::Transport* transport);
+    // The stream from where the last plan ended up to UTC `untilMs` comes from `transport` (of
+    // `network`); a null transport lets the span pass without packets (no signal). Planned
+    // under the receiver's lock, so plans keep the order of the receiver's changes, and
+    // written by whichever thread calls catchUp() or finish() next.
+    void plan(int64_t untilMs, const dvbmodel::Network* network,
+              const dvbmodel::Transport* transport);
+    // Writes what is planned, in order.
+    void catchUp();
+    // catchUp, then closes the file; later writes do nothing.
+    void finish();
 
     // Closes the file and removes it.
     void discard();
@@ -52,11 +55,20 @@ private:
     Recording(std::string path, int fd, const dvbmodel::Broadcast& broadcast,
               const dvbmodel::Service* only, int64_t startMs);
 
+    struct Plan {
+        int64_t until;
+        const dvbmodel::Network* network;
+        const dvbmodel::Transport* transport;
+    };
+    void write(const Plan& plan);  // under mLock
+
     const std::string mPath;
     const dvbmodel::Broadcast& mBroadcast;
     const dvbmodel::Service* const mOnly;
     const int64_t mStart;
-    std::mutex mLock;  // one writer at a time; never taken under the receiver's lock
+    std::mutex mLock;      // one writer at a time; never taken under the receiver's lock
+    std::mutex mPlanLock;  // held only to add or take plans, under the receiver's lock too
+    std::vector<Plan> mPlans;
     int mFd;
     dvbmodel::TsWriterState mState;
     std::vector<uint8_t> mBuffer;

@@ -16,6 +16,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <fstream>
+#include <future>
 #include <mutex>
 #include <set>
 #include <thread>
@@ -398,6 +399,36 @@ TEST_F(ReceiverTest, FilesBeingMadeHoldOffASecondStartAndAStopAndAFullOneHoldsPl
               std::make_tuple(0, 0, kPvrTrick, 0));
 }
 
+// A time shift keeps its file to itself, and a retune that the service thread has not looked
+// at yet (it is held meanwhile) leaves the time shift and the dump on that front end what they
+// received before it.
+TEST_F(ReceiverTest, RecordingsKeepTheirFileAndWhatTheyReceivedBeforeARetune) {
+    int32_t h;
+    ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
+    rx->recordDir = dir;
+    STRM_Settings shift{};
+    strm->GetSettings(h, &shift);
+    shift.playSpeed = shift.playSpeedDiv = 1;
+    const std::string dump = dir + "/dump.ts";
+    ASSERT_EQ(strm->SetSettings(h, &shift) | cfg->TSDumpStart(0, 0, 0, dump.c_str()), kOk);
+    int32_t same;  // a second stream of the service, in the same second: its file would be h's
+    ASSERT_EQ(startStream(sat(12551500, 1), 28006, &same), kOk);
+    EXPECT_EQ(strm->SetSettings(same, &shift), kErrBusy);
+    std::promise<void> go;
+    std::shared_future<void> held = go.get_future().share();
+    rx->post([held] { held.wait(); });
+    rx->clock().advance(5000);
+    P other = sat(11493750, 0);
+    ASSERT_EQ(cfg->Tune(0, &other), kOk);
+    go.set_value();
+    rx->sync();
+    STRM_GetStatus st{};
+    strm->GetStatus(h, &st);
+    EXPECT_EQ(cfg->TSDumpStop(), kOk);
+    EXPECT_GT(st.recsize, 0);
+    EXPECT_GT(std::filesystem::file_size(dump), 0u);
+}
+
 TEST_F(ReceiverTest, BadInputGetsItsResult) {
     int32_t h;
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
@@ -437,6 +468,15 @@ TEST_F(ReceiverTest, BadInputGetsItsResult) {
             {"dump to no folder",
              [&] { return cfg->TSDumpStart(0, 0, 0, "/nonexistent/dir/dump.ts"); }, kErrPath},
             {"volume 101", [&] { return cfg->SetAudioVolume(101); }, kErrBadParameter},
+            {"subtitles of stream 2^31 + h",
+             [&] {
+                 SUBTTL_Settings sub{};
+                 sub.pid = 0x205, sub.hstrm = 0x80000000u | static_cast<uint32_t>(h);
+                 return subttl->Start(&sub);
+             },
+             kErrBadHandle},
+            {"handles counted round to one open",
+             [&] { return rx->nextHandle = tt, teltxt->Start(&txt); }, tt + 1},
             {"stream closed", [&] { return strm->Close(h) | strm->GetStatus(h, &st); },
              kErrBadHandle},
             {"teletext ended with its stream", [&] { return teltxt->Stop(tt); }, kErrBadHandle},
@@ -724,4 +764,34 @@ TEST_F(DecodersTest, NavigationFollowsTheLinksOrThePagesPresent) {
     }
 }
 
+// A file played back from mid-second shows each display set at its time from the stream's
+// start (not from the whole second before it).
+TEST_F(DecodersTest, PlaybackShowsDisplaySetsAtTheirTimesFromItsStart) {
+    std::string dir = ::testing::TempDir() + "playback-XXXXXX";
+    ASSERT_NE(mkdtemp(dir.data()), nullptr);
+    rx->recordDir = dir;
+    STRM_Settings s{};
+    strm->GetSettings(stream, &s);
+    s.playSpeed = s.playSpeedDiv = 1;
+    ASSERT_EQ(strm->SetSettings(stream, &s), kOk);
+    STRM_OpenSettings back{};
+    snprintf(back.szPath, sizeof back.szPath, "%s",
+             rx->streams.at(stream).recording->path().c_str());
+    advance(6000);
+    ASSERT_EQ(strm->Stop(stream, 0), kOk);
+    int32_t p = strm->Open(&back);
+    advance(700);
+    ASSERT_EQ(strm->Start(p, &s), kOk);
+    SUBTTL_Settings sub{};
+    sub.pid = 0x105, sub.compositionPageId = sub.ancillaryPageId = 1, sub.hstrm = p;
+    int32_t h = subttl->Start(&sub);
+    std::vector<uint8_t> data(sizeof(SUBTTL_Data));
+    advance(rx->streams.at(p).service->subtitles.at(0).time);
+    ASSERT_EQ(subttl->GetData(h, data.data()), kOk);
+    STRM_GetStatus st{};
+    strm->GetStatus(p, &st);
+    // Sent just now: its PTS is the stream's.
+    EXPECT_EQ(reinterpret_cast<SUBTTL_Data*>(data.data())->i_pts, st.localPts);
+    std::filesystem::remove_all(dir);
+}
 }  // namespace

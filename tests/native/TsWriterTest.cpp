@@ -260,6 +260,22 @@ TEST(TsWriter, SpansJoinIntoTheStreamOfOneSpan) {
     }
 }
 
+// Without a PCR a capture's length comes from its PTS, which may wrap round 2^33 within it.
+TEST(TsReader, APtsCaptureAcrossThePtsWrapLastsWhatItHolds) {
+    Broadcast b = builtinBroadcast(kStart / 1000);
+    Transport tp = b.networks[0].transports[0];
+    for (Service& s : tp.services) s.pcrPid = 0x1FFF;
+    const int64_t wrap = ((kStart * 90 >> 33) + 1) * (int64_t{1} << 33) / 90;
+    std::vector<uint8_t> ts;
+    TsWriterState state;
+    writeTransport(b, b.networks[0], tp, wrap - 1000, 2000, ts, state);
+    TsCapture c;
+    TsReadStats stats;
+    std::string error;
+    ASSERT_TRUE(readTransportStream(ts.data(), ts.size(), "wrap", c, error, stats)) << error;
+    EXPECT_NEAR(c.ptsDurationMs, 2000, 100);
+}
+
 // A receiver of the built-in broadcast on a fixed clock plays a service of a cable multiplex,
 // records it and dumps the multiplex.
 TEST(TsRecording, TimeShiftRecordsTheServiceAndADumpTheTransponder) {

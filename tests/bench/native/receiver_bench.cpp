@@ -331,7 +331,8 @@ void BM_Recording(benchmark::State& state) {
     std::string path = folder() + "/recording.ts";
     for (auto _ : state) {
         auto rec = dvbrx::Recording::create(path, broadcast, &tp->services[0], kStart * 1000);
-        rec->finish(kStart * 1000 + kRecordMillis, net, tp);
+        rec->plan(kStart * 1000 + kRecordMillis, net, tp);
+        rec->finish();
         state.SetBytesProcessed(rec->bytes());
     }
     std::ifstream in(path, std::ios::binary);
