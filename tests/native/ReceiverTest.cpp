@@ -405,11 +405,11 @@ TEST_F(ReceiverTest, FilesBeingMadeHoldOffASecondStartAndAStopAndAFullOneHoldsPl
 TEST_F(ReceiverTest, RecordingsKeepTheirFileAndWhatTheyReceivedBeforeARetune) {
     int32_t h;
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
-    rx->recordDir = dir;
+    rx->recordDir = dir.path;
     STRM_Settings shift{};
     strm->GetSettings(h, &shift);
     shift.playSpeed = shift.playSpeedDiv = 1;
-    const std::string dump = dir + "/dump.ts";
+    const std::string dump = dir / "dump.ts";
     ASSERT_EQ(strm->SetSettings(h, &shift) | cfg->TSDumpStart(0, 0, 0, dump.c_str()), kOk);
     int32_t same;  // a second stream of the service, in the same second: its file would be h's
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &same), kOk);
@@ -767,9 +767,8 @@ TEST_F(DecodersTest, NavigationFollowsTheLinksOrThePagesPresent) {
 // A file played back from mid-second shows each display set at its time from the stream's
 // start (not from the whole second before it).
 TEST_F(DecodersTest, PlaybackShowsDisplaySetsAtTheirTimesFromItsStart) {
-    std::string dir = ::testing::TempDir() + "playback-XXXXXX";
-    ASSERT_NE(mkdtemp(dir.data()), nullptr);
-    rx->recordDir = dir;
+    testdata::TempDir dir;
+    rx->recordDir = dir.path;
     STRM_Settings s{};
     strm->GetSettings(stream, &s);
     s.playSpeed = s.playSpeedDiv = 1;
@@ -792,6 +791,5 @@ TEST_F(DecodersTest, PlaybackShowsDisplaySetsAtTheirTimesFromItsStart) {
     strm->GetStatus(p, &st);
     // Sent just now: its PTS is the stream's.
     EXPECT_EQ(reinterpret_cast<SUBTTL_Data*>(data.data())->i_pts, st.localPts);
-    std::filesystem::remove_all(dir);
 }
 }  // namespace
