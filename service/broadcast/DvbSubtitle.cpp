@@ -79,44 +79,61 @@ private:
     int filled_ = 0;
 };
 
-ClutEntry fromRgb(int r, int g, int b, int alpha) {
-    if (alpha == 0) return ClutEntry{0, 0, 0, 255};
-    // BT.601 studio range, rounded; the offsets keep every shifted sum non-negative.
-    int y = ((66 * r + 129 * g + 25 * b + 128) >> 8) + 16;
-    int cr = ((112 * r - 94 * g - 18 * b + 128 + (128 << 8)) >> 8);
-    int cb = ((-38 * r - 74 * g + 112 * b + 128 + (128 << 8)) >> 8);
-    return ClutEntry{static_cast<uint8_t>(y), static_cast<uint8_t>(cr), static_cast<uint8_t>(cb),
-                     static_cast<uint8_t>(255 - alpha)};
+// Rounds num / den (den > 0) to the nearest integer, halves away from zero.
+int roundDiv(int64_t num, int64_t den) {
+    return static_cast<int>(num >= 0 ? (num + den / 2) / den : -((-num + den / 2) / den));
+}
+
+// A colour level given in sixths of full scale (the standard's 100 %, 66.7 %, 50 %, 33.3 %
+// and 16.7 % are 6, 4, 3, 2 and 1 sixths), as 0..255.
+int level(int sixths) {
+    return roundDiv(sixths * 255, 6);
+}
+
+constexpr ClutEntry kTransparent{0, 128, 128, 255};
+
+// An entry of a default table from its levels in sixths and its transparency in percent.
+ClutEntry entry(int r, int g, int b, int transparency) {
+    return yccOf(level(r), level(g), level(b), roundDiv(transparency * 255, 100));
 }
 
 Clut makeDefaultClut() {
     Clut c;
-    c.c2 = {fromRgb(0, 0, 0, 0), fromRgb(255, 255, 255, 255), fromRgb(0, 0, 0, 255),
-            fromRgb(127, 127, 127, 255)};
-    // 16 entries: bit 0 red, bit 1 green, bit 2 blue, at full level, or half level with bit 3.
+    // 2 bit: transparent, white, black, 50 % grey.
+    c.c2 = {kTransparent, entry(6, 6, 6, 0), entry(0, 0, 0, 0), entry(3, 3, 3, 0)};
+    // 4 bit, entry bits b1 b2 b3 b4 (b1 the highest): b4 red, b3 green, b2 blue, at full level
+    // when b1 is 0 and at half level when it is 1.
     for (int i = 0; i < 16; ++i) {
-        int level = i < 8 ? 255 : 127;
-        c.c4[i] = i == 0 ? fromRgb(0, 0, 0, 0)
-                         : fromRgb(i & 1 ? level : 0, i & 2 ? level : 0, i & 4 ? level : 0, 255);
+        const int full = (i & 8) != 0 ? 3 : 6;
+        c.c4[i] = i == 0 ? kTransparent
+                         : entry((i & 1) * full, (i >> 1 & 1) * full, (i >> 2 & 1) * full, 0);
     }
-    // 256 entries: bits 0-2 and 4-6 weigh red, green and blue; bits 7 and 3 choose the range
-    // and transparency. The first eight are the primaries at 75 % transparency.
+    // 8 bit, entry bits b1 .. b8 (b1 the highest): b8, b7, b6 the low part of red, green and
+    // blue, b4, b3, b2 their high part; b1 and b5 choose the range and the transparency.
     for (int i = 0; i < 256; ++i) {
-        auto level = [i](int lo, int hi, int bit) {
-            return (i & (1 << bit) ? lo : 0) + (i & (0x10 << bit) ? hi : 0);
-        };
-        int r, g, b, a = 255;
-        if (i < 8) {
-            r = i & 1 ? 255 : 0, g = i & 2 ? 255 : 0, b = i & 4 ? 255 : 0, a = i == 0 ? 0 : 63;
-        } else if ((i & 0x88) == 0x00 || (i & 0x88) == 0x08) {
-            r = level(85, 170, 0), g = level(85, 170, 1), b = level(85, 170, 2);
-            a = (i & 0x08) ? 127 : 255;
-        } else if ((i & 0x88) == 0x80) {
-            r = 127 + level(43, 85, 0), g = 127 + level(43, 85, 1), b = 127 + level(43, 85, 2);
-        } else {
-            r = level(43, 85, 0), g = level(43, 85, 1), b = level(43, 85, 2);
+        const int lo[3] = {i & 1, i >> 1 & 1, i >> 2 & 1};
+        const int hi[3] = {i >> 4 & 1, i >> 5 & 1, i >> 6 & 1};
+        const bool b1 = (i & 0x80) != 0, b5 = (i & 0x08) != 0;
+        int rgb[3];
+        int transparency = 0;
+        for (int k = 0; k < 3; ++k) {
+            // 33.3 % and 66.7 %; or 16.7 % and 33.3 %, + 50 % unless b5.
+            rgb[k] = !b1 ? lo[k] * 2 + hi[k] * 4 : lo[k] + hi[k] * 2 + (b5 ? 0 : 3);
         }
-        c.c8[i] = fromRgb(r, g, b, a);
+        if (!b1 && !b5) {
+            if (i == 0) {
+                c.c8[i] = kTransparent;
+                continue;
+            }
+            // Entries 1..7: the full colours at 75 % transparency.
+            if ((i & 0x70) == 0) {
+                for (int k = 0; k < 3; ++k) rgb[k] = lo[k] * 6;
+                transparency = 75;
+            }
+        } else if (!b1 && b5) {
+            transparency = 50;
+        }
+        c.c8[i] = entry(rgb[0], rgb[1], rgb[2], transparency);
     }
     return c;
 }
@@ -127,6 +144,14 @@ int depthBits(uint8_t code) {
 }
 
 }  // namespace
+
+ClutEntry yccOf(int r, int g, int b, int t) {
+    const int y = 16 + roundDiv(65481LL * r + 128553LL * g + 24966LL * b, 255000);
+    const int cb = 128 + roundDiv(-37797LL * r - 74203LL * g + 112000LL * b, 255000);
+    const int cr = 128 + roundDiv(112000LL * r - 93786LL * g - 18214LL * b, 255000);
+    return {static_cast<uint8_t>(y), static_cast<uint8_t>(cr), static_cast<uint8_t>(cb),
+            static_cast<uint8_t>(t)};
+}
 
 const Clut& defaultClut() {
     static const Clut c = makeDefaultClut();

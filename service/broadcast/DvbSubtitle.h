@@ -30,9 +30,13 @@ struct DvbSubtitleStats {
 };
 
 // The CLUT that a region uses when its own was never defined, and the start of every CLUT
-// of an epoch: the default contents of the 4-, 16- and 256-entry tables, their RGB values
-// given as BT.601 Y, Cr, Cb (entry 0 of each table fully transparent, Y 0).
+// of an epoch: the default contents of the 4-, 16- and 256-entry tables, computed from the RGB
+// and transparency levels that EN 300 743 gives them (T 0 opaque .. 255 transparent). Fully
+// transparent entries read Y 0, Cr 128, Cb 128, T 255.
 const Clut& defaultClut();
+
+// One colour in the Y/Cr/Cb/T form: BT.601 studio range (Y 16..235), rounded to the nearest.
+ClutEntry yccOf(int r, int g, int b, int t);
 
 // Decodes the PES packets of one subtitle PID for one composition page and its ancillary
 // page. Segments of other pages are skipped.

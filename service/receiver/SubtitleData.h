@@ -8,14 +8,9 @@
 
 namespace dvbrx {
 
-// EN 300 743's default CLUT, in the Y/Cr/Cb/T form of the buffer: its 2-, 4- and 8-bit tables,
-// computed from the RGB and transparency levels that the standard gives them (BT.601 studio
-// range, T 0 opaque .. 255 transparent); id and version 0. Fully transparent entries read
-// Y 0, Cr 128, Cb 128, T 255.
+// The subtitle codec's default CLUT (dvbmodel::defaultClut) in the buffer's form; id and
+// version 0.
 const SUBTTL_Clut& defaultClut();
-
-// One colour in the Y/Cr/Cb/T form: BT.601, Y 16..235, rounded to the nearest.
-SUBTTL_ClutEntry yccOf(int r, int g, int b, int t);
 
 // Writes `set`, shown with presentation time stamp `pts`, into `data`: the counts, the page
 // (with its version), the first kSubttlRegions regions with their placements, pixels and
