@@ -83,6 +83,23 @@ protected:
         s.audioPid = svc == 28006 ? 0x202 : 0;
         return strm->Start(*h, &s);
     }
+    STRM_GetStatus streamStatus(int32_t h) {
+        STRM_GetStatus st{};
+        return strm->GetStatus(h, &st), st;
+    }
+    // The settings of stream `h` that time-shift it at `speed` into the scratch folder.
+    STRM_Settings shifted(int32_t h, int32_t speed) {
+        rx->recordDir = dir.path;
+        STRM_Settings s{};
+        strm->GetSettings(h, &s);
+        s.playSpeed = speed, s.playSpeedDiv = 1;
+        return s;
+    }
+    int32_t startSubtitles(uint16_t pid, uint32_t stream) {
+        SUBTTL_Settings sub{};
+        sub.pid = pid, sub.compositionPageId = sub.ancillaryPageId = 1, sub.hstrm = stream;
+        return subttl->Start(&sub);
+    }
     // The events with a code in [from, to] in the order raised; the others stay.
     Events take(int from, int to = 0) {
         std::lock_guard<std::mutex> lock(eventLock);
@@ -94,6 +111,7 @@ protected:
         return out;
     }
 
+    testdata::TempDir dir;  // first: it goes after the receiver and its event database
     std::mutex eventLock;
     Events events;
     std::shared_ptr<Receiver> rx;
@@ -107,7 +125,6 @@ protected:
 class ReceiverTest : public Harness {
 protected:
     ReceiverTest() { start(fallbackBroadcast(kStart / 1000)); }
-    ~ReceiverTest() override { rx.reset(); }  // the database closed before its folder goes
 
     int32_t systemInit(const std::string& path) {
         setenv("DVB_EPG_DB", path.c_str(), 1);
@@ -122,8 +139,6 @@ protected:
         cfg->GetStatus(0, &st);
         return st;
     }
-
-    testdata::TempDir dir;
 };
 
 TEST_F(ReceiverTest, TuneLocksOnlyWhereTheModelHasATransponder) {
@@ -291,11 +306,9 @@ TEST_F(ReceiverTest, AStreamPlaysWhatTheTransponderCarries) {
     EXPECT_EQ(startStream(sat(12551500, 1), 10301, &h), kErrNoService);
     EXPECT_EQ(startStream(sat(12600000, 1), 28006, &h), kErrNoSignal);
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
-    STRM_GetStatus st{};
-    strm->GetStatus(h, &st);
-    EXPECT_EQ(st.pictureStatus, kNoPicture);
+    EXPECT_EQ(streamStatus(h).pictureStatus, kNoPicture);
     advance(400);
-    strm->GetStatus(h, &st);
+    STRM_GetStatus st = streamStatus(h);
     EXPECT_EQ(std::make_tuple(st.feStatus, st.pictureStatus, st.fpsInteger, st.fpsDecimal),
               std::make_tuple(0x1F, kDecoding, 25, 0));
     // Presented frames: the last video frame (40 ms) and audio frame (24 ms) begun by now.
@@ -303,8 +316,7 @@ TEST_F(ReceiverTest, AStreamPlaysWhatTheTransponderCarries) {
     EXPECT_LT(static_cast<uint32_t>(st.localPts - st.audioPts), 2160u);
     int32_t before = st.localPts;
     advance(1000);
-    strm->GetStatus(h, &st);
-    EXPECT_EQ(static_cast<uint32_t>(st.localPts - before), 90000u);
+    EXPECT_EQ(static_cast<uint32_t>(streamStatus(h).localPts - before), 90000u);
 
     STRM_StreamInfo info{};
     ASSERT_EQ(strm->CreatStreamInfo(h, &info), kOk);
@@ -331,16 +343,14 @@ TEST_F(ReceiverTest, AStreamPlaysWhatTheTransponderCarries) {
     EXPECT_EQ(take(kEvtPresent), (Events{{kEvtPresent, h, following.evtId}}));
 
     // Time shift: recording from now, paused 5 s into it.
-    STRM_Settings s{};
-    strm->GetSettings(h, &s);
+    STRM_Settings s = shifted(h, 0);
     EXPECT_EQ(s.svcId, 28006);
-    s.playSpeed = 0, s.playSpeedDiv = 1, s.posTime = 5;
-    ASSERT_EQ(strm->SetSettings(h, &s), kOk);
-    advance(10000);
     s.posTime = 5;
     ASSERT_EQ(strm->SetSettings(h, &s), kOk);
     advance(10000);
-    strm->GetStatus(h, &st);
+    ASSERT_EQ(strm->SetSettings(h, &s), kOk);
+    advance(10000);
+    st = streamStatus(h);
     EXPECT_EQ(std::make_tuple(st.recstate, st.recduration, st.pbstate, st.pbposition),
               std::make_tuple(kPvrActive, 20, kPvrPaused, 5));
 }
@@ -351,11 +361,8 @@ TEST_F(ReceiverTest, AStreamPlaysWhatTheTransponderCarries) {
 TEST_F(ReceiverTest, FilesBeingMadeHoldOffASecondStartAndAStopAndAFullOneHoldsPlayBack) {
     int32_t h;
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
-    rx->recordDir = dir.path;
+    const STRM_Settings shift = shifted(h, 2), live{};
     const std::string dump = dir / "dump", other = dir / "other.ts";
-    STRM_Settings shift{}, live{};
-    strm->GetSettings(h, &shift);
-    shift.playSpeed = 2, shift.playSpeedDiv = 1;
     const Stream& stream = rx->streams.at(h);
     const struct {
         std::string fifo, other;
@@ -393,8 +400,7 @@ TEST_F(ReceiverTest, FilesBeingMadeHoldOffASecondStartAndAStopAndAFullOneHoldsPl
     std::filesystem::create_symlink("/dev/full", rx->recordingPath(stream, kStart + 2000));
     ASSERT_EQ(strm->SetSettings(h, &shift), kOk);
     advance(10000);
-    STRM_GetStatus st{};
-    strm->GetStatus(h, &st);
+    const STRM_GetStatus st = streamStatus(h);
     EXPECT_EQ(std::make_tuple(st.recduration, st.recsize, st.pbstate, st.pbposition),
               std::make_tuple(0, 0, kPvrTrick, 0));
 }
@@ -403,34 +409,27 @@ TEST_F(ReceiverTest, FilesBeingMadeHoldOffASecondStartAndAStopAndAFullOneHoldsPl
 // at yet (it is held meanwhile) leaves the time shift and the dump on that front end what they
 // received before it.
 TEST_F(ReceiverTest, RecordingsKeepTheirFileAndWhatTheyReceivedBeforeARetune) {
-    int32_t h;
+    int32_t h, same;  // same: a second stream of the service, whose file this second is h's
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
-    rx->recordDir = dir.path;
-    STRM_Settings shift{};
-    strm->GetSettings(h, &shift);
-    shift.playSpeed = shift.playSpeedDiv = 1;
+    const STRM_Settings shift = shifted(h, 1);
     const std::string dump = dir / "dump.ts";
     ASSERT_EQ(strm->SetSettings(h, &shift) | cfg->TSDumpStart(0, 0, 0, dump.c_str()), kOk);
-    int32_t same;  // a second stream of the service, in the same second: its file would be h's
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &same), kOk);
     EXPECT_EQ(strm->SetSettings(same, &shift), kErrBusy);
     std::promise<void> go;
-    std::shared_future<void> held = go.get_future().share();
-    rx->post([held] { held.wait(); });
+    rx->post([held = go.get_future().share()] { held.wait(); });
     rx->clock().advance(5000);
-    P other = sat(11493750, 0);
+    const P other = sat(11493750, 0);
     ASSERT_EQ(cfg->Tune(0, &other), kOk);
     go.set_value();
     rx->sync();
-    STRM_GetStatus st{};
-    strm->GetStatus(h, &st);
     EXPECT_EQ(cfg->TSDumpStop(), kOk);
-    EXPECT_GT(st.recsize, 0);
+    EXPECT_GT(streamStatus(h).recsize, 0);
     EXPECT_GT(std::filesystem::file_size(dump), 0u);
 }
 
 TEST_F(ReceiverTest, BadInputGetsItsResult) {
-    int32_t h;
+    int32_t h, n[4];  // n: a page's links
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
     SCNM_OpenSettings scanOpen{0, 0};
     int32_t scan = scnm->Open(&scanOpen);
@@ -440,7 +439,6 @@ TEST_F(ReceiverTest, BadInputGetsItsResult) {
     SCNM_ServiceInfo* list = nullptr;
     SCNMNET_FrontEndSettings* nets = nullptr;
     uint8_t buf[8];
-    int32_t nav[4];
     uint32_t t;
     STRM_OpenSettings badOpen{};
     badOpen.frontend = 3;
@@ -448,40 +446,24 @@ TEST_F(ReceiverTest, BadInputGetsItsResult) {
     txt.pid = 0x206;
     int32_t tt = teltxt->Start(&txt);
     ASSERT_GT(tt, 0);
-    const struct {
-        const char* what;
-        std::function<int32_t()> op;
-        int32_t result;
-    } cases[] = {
-            {"scan used after close", [&] { return scnm->GetStatus(scan, &sst); }, kErrBadHandle},
-            {"scan list after close", [&] { return scnm->CreateServiceList(scan, &list); },
-             kErrBadHandle},
-            {"networks after close", [&] { return scnm->CreateNetworkList(scan, &nets); },
-             kErrBadHandle},
-            {"unknown stream", [&] { return strm->GetStatus(12345, &st); }, kErrBadHandle},
-            {"stream on no front end", [&] { return strm->Open(&badOpen); }, kErrBadParameter},
-            {"time of no stream", [&] { return strm->GetTime(-7, &t); }, kErrBadHandle},
-            {"negative count", [&] { return teltxt->GetData(tt, 0, -1, buf); }, kErrBadParameter},
-            {"page 99",
-             [&] { return teltxt->SetData(tt, 99, 0, &nav[0], &nav[1], &nav[2], &nav[3]); },
-             kErrBadParameter},
-            {"dump to no folder",
-             [&] { return cfg->TSDumpStart(0, 0, 0, "/nonexistent/dir/dump.ts"); }, kErrPath},
-            {"volume 101", [&] { return cfg->SetAudioVolume(101); }, kErrBadParameter},
-            {"subtitles of stream 2^31 + h",
-             [&] {
-                 SUBTTL_Settings sub{};
-                 sub.pid = 0x205, sub.hstrm = 0x80000000u | static_cast<uint32_t>(h);
-                 return subttl->Start(&sub);
-             },
-             kErrBadHandle},
+    constexpr int32_t kBad = kErrBadParameter, kGone = kErrBadHandle;  // gone: unknown or closed
+    const std::tuple<const char*, std::function<int32_t()>, int32_t> cases[] = {
+            {"scan used after close", [&] { return scnm->GetStatus(scan, &sst); }, kGone},
+            {"scan list after close", [&] { return scnm->CreateServiceList(scan, &list); }, kGone},
+            {"networks after close", [&] { return scnm->CreateNetworkList(scan, &nets); }, kGone},
+            {"unknown stream", [&] { return strm->GetStatus(12345, &st); }, kGone},
+            {"stream on no front end", [&] { return strm->Open(&badOpen); }, kBad},
+            {"time of no stream", [&] { return strm->GetTime(-7, &t); }, kGone},
+            {"negative count", [&] { return teltxt->GetData(tt, 0, -1, buf); }, kBad},
+            {"page 99", [&] { return teltxt->SetData(tt, 99, 0, n, n + 1, n + 2, n + 3); }, kBad},
+            {"volume 101", [&] { return cfg->SetAudioVolume(101); }, kBad},
+            {"subtitles, 2^31 + h", [&] { return startSubtitles(0x205, 0x80000000u | h); }, kGone},
             {"handles counted round to one open",
              [&] { return rx->nextHandle = tt, teltxt->Start(&txt); }, tt + 1},
-            {"stream closed", [&] { return strm->Close(h) | strm->GetStatus(h, &st); },
-             kErrBadHandle},
-            {"teletext ended with its stream", [&] { return teltxt->Stop(tt); }, kErrBadHandle},
+            {"stream closed", [&] { return strm->Close(h) | strm->GetStatus(h, &st); }, kGone},
+            {"teletext ended with its stream", [&] { return teltxt->Stop(tt); }, kGone},
     };
-    for (const auto& c : cases) EXPECT_EQ(c.op(), c.result) << c.what;
+    for (const auto& [what, op, result] : cases) EXPECT_EQ(op(), result) << what;
     EXPECT_EQ(sst.result, kErrBadHandle);
     EXPECT_TRUE(list == nullptr && nets == nullptr);
 }
@@ -587,9 +569,7 @@ protected:
         service = &rx->broadcast().networks[3].transports[0].services[0];
         EXPECT_EQ(startStream(terrestrial(506000), 0x0311, &stream), kOk);
         advance(1000);
-        SUBTTL_Settings sub{};
-        sub.pid = 0x105, sub.compositionPageId = sub.ancillaryPageId = 1, sub.hstrm = stream;
-        subHandle = subttl->Start(&sub);
+        subHandle = startSubtitles(0x105, stream);
         TELTXT_Settings txt{};
         txt.pid = 0x106;
         txtHandle = teltxt->Start(&txt);
@@ -617,10 +597,8 @@ TEST_F(DecodersTest, SubtitleBufferHoldsTheModelsDisplaySetWithTheStreamsPts) {
     auto* data = reinterpret_cast<SUBTTL_Data*>(bytes.data());
     ASSERT_EQ(subttl->GetData(subHandle, data), kOk);
     const dvbmodel::DisplaySet& set = service->subtitles[0];
-    STRM_GetStatus st{};
-    strm->GetStatus(stream, &st);
     // Shown at the loop's start, 1000 ms ago.
-    EXPECT_EQ(static_cast<uint32_t>(st.localPts - data->i_pts), 90000u);
+    EXPECT_EQ(static_cast<uint32_t>(streamStatus(stream).localPts - data->i_pts), 90000u);
     const SUBTTL_Page_t& page = data->page[0];
     const SUBTTL_Display& display = data->display;
     EXPECT_EQ(std::vector<int32_t>({data->numPage, page.i_id, page.i_timeout, page.i_state,
@@ -767,11 +745,7 @@ TEST_F(DecodersTest, NavigationFollowsTheLinksOrThePagesPresent) {
 // A file played back from mid-second shows each display set at its time from the stream's
 // start (not from the whole second before it).
 TEST_F(DecodersTest, PlaybackShowsDisplaySetsAtTheirTimesFromItsStart) {
-    testdata::TempDir dir;
-    rx->recordDir = dir.path;
-    STRM_Settings s{};
-    strm->GetSettings(stream, &s);
-    s.playSpeed = s.playSpeedDiv = 1;
+    const STRM_Settings s = shifted(stream, 1);
     ASSERT_EQ(strm->SetSettings(stream, &s), kOk);
     STRM_OpenSettings back{};
     snprintf(back.szPath, sizeof back.szPath, "%s",
@@ -781,15 +755,11 @@ TEST_F(DecodersTest, PlaybackShowsDisplaySetsAtTheirTimesFromItsStart) {
     int32_t p = strm->Open(&back);
     advance(700);
     ASSERT_EQ(strm->Start(p, &s), kOk);
-    SUBTTL_Settings sub{};
-    sub.pid = 0x105, sub.compositionPageId = sub.ancillaryPageId = 1, sub.hstrm = p;
-    int32_t h = subttl->Start(&sub);
+    int32_t h = startSubtitles(0x105, p);
     std::vector<uint8_t> data(sizeof(SUBTTL_Data));
     advance(rx->streams.at(p).service->subtitles.at(0).time);
     ASSERT_EQ(subttl->GetData(h, data.data()), kOk);
-    STRM_GetStatus st{};
-    strm->GetStatus(p, &st);
     // Sent just now: its PTS is the stream's.
-    EXPECT_EQ(reinterpret_cast<SUBTTL_Data*>(data.data())->i_pts, st.localPts);
+    EXPECT_EQ(reinterpret_cast<SUBTTL_Data*>(data.data())->i_pts, streamStatus(p).localPts);
 }
 }  // namespace
