@@ -364,14 +364,13 @@ TEST_F(ReceiverTest, FilesBeingMadeHoldOffASecondStartAndAStopAndAFullOneHoldsPl
     const STRM_Settings shift = shifted(h, 2), live{};
     const std::string dump = dir / "dump", other = dir / "other.ts";
     const Stream& stream = rx->streams.at(h);
+    auto shiftOn = [&] { return strm->SetSettings(h, &shift); };
     const struct {
         std::string fifo, other;
         std::function<int32_t()> start, second, stop;
     } cases[] = {
-            {rx->recordingPath(stream, kStart), rx->recordingPath(stream, kStart + 1000),
-             [&] { return strm->SetSettings(h, &shift); },
-             [&] { return strm->SetSettings(h, &shift); },
-             [&] { return strm->SetSettings(h, &live); }},
+            {rx->recordingPath(stream, kStart), rx->recordingPath(stream, kStart + 1000), shiftOn,
+             shiftOn, [&] { return strm->SetSettings(h, &live); }},
             {dump, other, [&] { return cfg->TSDumpStart(0, 0, 0, dump.c_str()); },
              [&] { return cfg->TSDumpStart(0, 0, 0, other.c_str()); },
              [&] { return cfg->TSDumpStop(); }},
@@ -389,16 +388,14 @@ TEST_F(ReceiverTest, FilesBeingMadeHoldOffASecondStartAndAStopAndAFullOneHoldsPl
         int fd = open(c.fifo.c_str(), O_RDONLY);
         starting.join();
         std::thread drain([fd] {
-            char b[4096];
-            while (read(fd, b, sizeof b) > 0) {
-            }
+            for (char b[4096]; read(fd, b, sizeof b) > 0;) continue;
         });
         EXPECT_EQ(std::make_tuple(first, c.stop()), std::make_tuple(kOk, kOk)) << c.fifo;
         drain.join();
         close(fd);
     }
     std::filesystem::create_symlink("/dev/full", rx->recordingPath(stream, kStart + 2000));
-    ASSERT_EQ(strm->SetSettings(h, &shift), kOk);
+    ASSERT_EQ(shiftOn(), kOk);
     advance(10000);
     const STRM_GetStatus st = streamStatus(h);
     EXPECT_EQ(std::make_tuple(st.recduration, st.recsize, st.pbstate, st.pbposition),

@@ -15,7 +15,6 @@
 
 #include <algorithm>
 #include <cstdio>
-#include <fstream>
 #include <nlohmann/json.hpp>
 #include <set>
 #include <string>
