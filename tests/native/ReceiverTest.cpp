@@ -425,6 +425,69 @@ TEST_F(ReceiverTest, RecordingsKeepTheirFileAndWhatTheyReceivedBeforeARetune) {
     EXPECT_GT(std::filesystem::file_size(dump), 0u);
 }
 
+// A service of a cable multiplex of the built-in broadcast: time shift records it and plays it
+// back, the dump takes the multiplex; ffprobe reads both files as the model says.
+TEST_F(ReceiverTest, TimeShiftRecordsTheServiceAndADumpTheTransponder) {
+    start(dvbmodel::builtinBroadcast(kStart / 1000));
+    const dvbmodel::Transport* tp = nullptr;
+    for (const auto& net : rx->broadcast().networks)
+        for (const auto& t : net.transports)
+            tp = t.tuning.delivery == dvbmodel::Delivery::Cable ? &t : tp;
+    const dvbmodel::Service& svc = tp->services[0];
+    const P fe = cable(int32_t(tp->tuning.frequencyKHz), int32_t(tp->tuning.modulation));
+    int32_t h;
+    ASSERT_EQ(startStream(fe, svc.id, &h), kOk);
+    EXPECT_EQ(cfg->TSDumpStart(0, 0, 0, (dir / "missing/dump.ts").c_str()), kErrPath);
+    ASSERT_EQ(cfg->TSDumpStart(0, 0, 0, (dir / "dump.ts").c_str()), kOk);
+    EXPECT_EQ(cfg->TSDumpStart(0, 0, 0, (dir / "other.ts").c_str()), kErrBusy);
+    advance(1000);
+    const STRM_Settings s = shifted(h, 0);  // paused at 0: recording
+    rx->recordDir = dir / "missing";
+    EXPECT_EQ(strm->SetSettings(h, &s), kErrPath);
+    rx->recordDir = dir.path;
+    ASSERT_EQ(strm->SetSettings(h, &s), kOk);
+    advance(2500);
+    const STRM_GetStatus st = streamStatus(h);
+    const std::string file =
+            dir / ("rec-" + std::to_string(tp->onid) + "-" + std::to_string(tp->tsid) + "-" +
+                   std::to_string(svc.id) + "-" + std::to_string(kStart / 1000 + 1) + ".ts");
+    EXPECT_EQ(st.recduration, 2);
+    EXPECT_EQ(st.recsize, static_cast<int64_t>(std::filesystem::file_size(file)));
+    advance(500);
+    ASSERT_EQ(strm->Stop(h, 0), kOk);
+    ASSERT_EQ(cfg->TSDumpStop(), kOk);
+    EXPECT_GT(static_cast<int64_t>(std::filesystem::file_size(file)), st.recsize);  // to the stop
+
+    // The recording plays back through a stream opened on its path, its own service only.
+    STRM_OpenSettings back{};
+    snprintf(back.szPath, sizeof back.szPath, "%s", (dir / "missing.ts").c_str());
+    EXPECT_EQ(strm->Open(&back), kErrPath);
+    ASSERT_LT(file.size(), sizeof back.szPath);
+    snprintf(back.szPath, sizeof back.szPath, "%s", file.c_str());
+    int32_t p = strm->Open(&back);
+    STRM_Settings play{};
+    play.svcId = tp->services[1].id;
+    EXPECT_EQ(strm->Start(p, &play), kErrNoService);
+    play.svcId = svc.id;
+    ASSERT_EQ(strm->Start(p, &play), kOk);
+    advance(1500);
+    const STRM_GetStatus pb = streamStatus(p);
+    STRM_StreamInfo info{};
+    ASSERT_EQ(strm->CreatStreamInfo(p, &info), kOk);
+    auto count = [&svc](dvbmodel::Kind k) {
+        return std::count_if(svc.components.begin(), svc.components.end(),
+                             [k](const dvbmodel::Component& c) { return c.kind == k; });
+    };
+    EXPECT_EQ(std::make_tuple(pb.pbstate, pb.pbposition, info.videoCount, info.audioCount,
+                              info.subtitleCount),
+              std::make_tuple(int32_t{kPvrActive}, 1, count(dvbmodel::Kind::Video),
+                              count(dvbmodel::Kind::Audio), count(dvbmodel::Kind::Subtitle)));
+    EXPECT_EQ(strm->SetSettings(p, &s), kErrNotSupported);  // not recorded again
+    NEED_FFPROBE();
+    EXPECT_EQ(testdata::probe(file), testdata::expected(*tp, &svc));
+    EXPECT_EQ(testdata::probe(dir / "dump.ts"), testdata::expected(*tp));
+}
+
 TEST_F(ReceiverTest, BadInputGetsItsResult) {
     int32_t h, n[4];  // n: a page's links
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
