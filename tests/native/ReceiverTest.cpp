@@ -429,9 +429,8 @@ TEST_F(ReceiverTest, TimeShiftRecordsTheServiceAndADumpTheTransponder) {
     start(dvbmodel::builtinBroadcast(kStart / 1000));
     const dvbmodel::Transport* tp = &rx->broadcast().networks[2].transports[1];  // 466 MHz
     const dvbmodel::Service& svc = tp->services[0];
-    const P fe = cable(int32_t(tp->tuning.frequencyKHz), int32_t(tp->tuning.modulation));
     int32_t h;
-    ASSERT_EQ(startStream(fe, svc.id, &h), kOk);
+    ASSERT_EQ(startStream(cable(466000, 4), svc.id, &h), kOk);  // QAM64
     EXPECT_EQ(cfg->TSDumpStart(0, 0, 0, (dir / "missing/dump.ts").c_str()), kErrPath);
     ASSERT_EQ(cfg->TSDumpStart(0, 0, 0, (dir / "dump.ts").c_str()), kOk);
     EXPECT_EQ(cfg->TSDumpStart(0, 0, 0, (dir / "other.ts").c_str()), kErrBusy);
@@ -443,9 +442,8 @@ TEST_F(ReceiverTest, TimeShiftRecordsTheServiceAndADumpTheTransponder) {
     ASSERT_EQ(strm->SetSettings(h, &s), kOk);
     advance(2500);
     const STRM_GetStatus st = streamStatus(h);
-    const std::string file =
-            dir / ("rec-" + std::to_string(tp->onid) + "-" + std::to_string(tp->tsid) + "-" +
-                   std::to_string(svc.id) + "-" + std::to_string(kStart / 1000 + 1) + ".ts");
+    // rec-<onid>-<tsid>-<service>-<UTC seconds of its start>.ts
+    const std::string file = dir / "rec-61441-2-513-1709323201.ts";
     EXPECT_EQ(st.recduration, 2);
     EXPECT_EQ(st.recsize, static_cast<int64_t>(std::filesystem::file_size(file)));
     advance(500);
