@@ -181,14 +181,10 @@ TEST(DvbTeletext, KeepsWhatIsSoundOfDamagedUnits) {
         ASSERT_EQ(pages.size(), count);
         if (!count) continue;
         TeletextPage want = original;
-        if (row == 26)
-            want.charset = kNoCharset;
-        else if (row == 25)
-            want.links = {};
-        else if (row >= 0 && col < 0)
-            want.rows[row].fill(' ');
-        else if (row >= 0)
-            want.rows[row][col] = ' ';
+        if (row == 26) want.charset = kNoCharset;
+        if (row == 25) want.links = {};
+        if (row >= 0 && row < 25 && col < 0) want.rows[row].fill(' ');
+        if (row >= 0 && row < 25 && col >= 0) want.rows[row][col] = ' ';
         EXPECT_EQ(std::tie(pages[0].rows, pages[0].links, pages[0].charset),
                   std::tie(want.rows, want.links, want.charset));
     }

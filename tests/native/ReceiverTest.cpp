@@ -83,6 +83,23 @@ protected:
         s.audioPid = svc == 28006 ? 0x202 : 0;
         return strm->Start(*h, &s);
     }
+    STRM_GetStatus streamStatus(int32_t h) {
+        STRM_GetStatus st{};
+        return strm->GetStatus(h, &st), st;
+    }
+    // The settings of stream `h` that time-shift it at `speed` into the scratch folder.
+    STRM_Settings shifted(int32_t h, int32_t speed) {
+        rx->recordDir = dir.path;
+        STRM_Settings s{};
+        strm->GetSettings(h, &s);
+        s.playSpeed = speed, s.playSpeedDiv = 1;
+        return s;
+    }
+    int32_t startSubtitles(uint16_t pid, uint32_t stream) {
+        SUBTTL_Settings sub{};
+        sub.pid = pid, sub.compositionPageId = sub.ancillaryPageId = 1, sub.hstrm = stream;
+        return subttl->Start(&sub);
+    }
     // The events with a code in [from, to] in the order raised; the others stay.
     Events take(int from, int to = 0) {
         std::lock_guard<std::mutex> lock(eventLock);
@@ -94,6 +111,7 @@ protected:
         return out;
     }
 
+    testdata::TempDir dir;  // first: it goes after the receiver and its event database
     std::mutex eventLock;
     Events events;
     std::shared_ptr<Receiver> rx;
@@ -107,7 +125,6 @@ protected:
 class ReceiverTest : public Harness {
 protected:
     ReceiverTest() { start(fallbackBroadcast(kStart / 1000)); }
-    ~ReceiverTest() override { rx.reset(); }  // the database closed before its folder goes
 
     int32_t systemInit(const std::string& path) {
         setenv("DVB_EPG_DB", path.c_str(), 1);
@@ -122,8 +139,6 @@ protected:
         cfg->GetStatus(0, &st);
         return st;
     }
-
-    testdata::TempDir dir;
 };
 
 TEST_F(ReceiverTest, TuneLocksOnlyWhereTheModelHasATransponder) {
@@ -273,14 +288,12 @@ TEST_F(ReceiverTest, EachKindOfScanFindsItsServicesInItsTime) {
         SCNM_ServiceInfo* svc = nullptr;
         EXPECT_EQ(scnm->CreateServiceList(h, &svc), static_cast<int32_t>(services.size()));
         std::set<int> found;
-        for (; svc != nullptr; svc = const_cast<SCNM_ServiceInfo*>(dvbListNext(svc)))
-            found.insert(svc->svcId);
+        for (const auto* s = svc; s != nullptr; s = dvbListNext(s)) found.insert(s->svcId);
         EXPECT_EQ(found, services);
         SCNMNET_FrontEndSettings* net = nullptr;
         scnm->CreateNetworkList(h, &net);
         std::vector<int32_t> types;
-        for (; net != nullptr; net = const_cast<SCNMNET_FrontEndSettings*>(dvbListNext(net)))
-            types.push_back(net->type);
+        for (const auto* n = net; n != nullptr; n = dvbListNext(n)) types.push_back(n->type);
         EXPECT_EQ(types, std::vector<int32_t>(transponders, fe.type));
         EXPECT_EQ(scnm->Close(h), kOk);
     }
@@ -291,11 +304,9 @@ TEST_F(ReceiverTest, AStreamPlaysWhatTheTransponderCarries) {
     EXPECT_EQ(startStream(sat(12551500, 1), 10301, &h), kErrNoService);
     EXPECT_EQ(startStream(sat(12600000, 1), 28006, &h), kErrNoSignal);
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
-    STRM_GetStatus st{};
-    strm->GetStatus(h, &st);
-    EXPECT_EQ(st.pictureStatus, kNoPicture);
+    EXPECT_EQ(streamStatus(h).pictureStatus, kNoPicture);
     advance(400);
-    strm->GetStatus(h, &st);
+    STRM_GetStatus st = streamStatus(h);
     EXPECT_EQ(std::make_tuple(st.feStatus, st.pictureStatus, st.fpsInteger, st.fpsDecimal),
               std::make_tuple(0x1F, kDecoding, 25, 0));
     // Presented frames: the last video frame (40 ms) and audio frame (24 ms) begun by now.
@@ -303,8 +314,7 @@ TEST_F(ReceiverTest, AStreamPlaysWhatTheTransponderCarries) {
     EXPECT_LT(static_cast<uint32_t>(st.localPts - st.audioPts), 2160u);
     int32_t before = st.localPts;
     advance(1000);
-    strm->GetStatus(h, &st);
-    EXPECT_EQ(static_cast<uint32_t>(st.localPts - before), 90000u);
+    EXPECT_EQ(static_cast<uint32_t>(streamStatus(h).localPts - before), 90000u);
 
     STRM_StreamInfo info{};
     ASSERT_EQ(strm->CreatStreamInfo(h, &info), kOk);
@@ -331,16 +341,14 @@ TEST_F(ReceiverTest, AStreamPlaysWhatTheTransponderCarries) {
     EXPECT_EQ(take(kEvtPresent), (Events{{kEvtPresent, h, following.evtId}}));
 
     // Time shift: recording from now, paused 5 s into it.
-    STRM_Settings s{};
-    strm->GetSettings(h, &s);
+    STRM_Settings s = shifted(h, 0);
     EXPECT_EQ(s.svcId, 28006);
-    s.playSpeed = 0, s.playSpeedDiv = 1, s.posTime = 5;
-    ASSERT_EQ(strm->SetSettings(h, &s), kOk);
-    advance(10000);
     s.posTime = 5;
     ASSERT_EQ(strm->SetSettings(h, &s), kOk);
     advance(10000);
-    strm->GetStatus(h, &st);
+    ASSERT_EQ(strm->SetSettings(h, &s), kOk);
+    advance(10000);
+    st = streamStatus(h);
     EXPECT_EQ(std::make_tuple(st.recstate, st.recduration, st.pbstate, st.pbposition),
               std::make_tuple(kPvrActive, 20, kPvrPaused, 5));
 }
@@ -351,20 +359,16 @@ TEST_F(ReceiverTest, AStreamPlaysWhatTheTransponderCarries) {
 TEST_F(ReceiverTest, FilesBeingMadeHoldOffASecondStartAndAStopAndAFullOneHoldsPlayBack) {
     int32_t h;
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
-    rx->recordDir = dir.path;
+    const STRM_Settings shift = shifted(h, 2), live{};
     const std::string dump = dir / "dump", other = dir / "other.ts";
-    STRM_Settings shift{}, live{};
-    strm->GetSettings(h, &shift);
-    shift.playSpeed = 2, shift.playSpeedDiv = 1;
     const Stream& stream = rx->streams.at(h);
+    auto shiftOn = [&] { return strm->SetSettings(h, &shift); };
     const struct {
         std::string fifo, other;
         std::function<int32_t()> start, second, stop;
     } cases[] = {
-            {rx->recordingPath(stream, kStart), rx->recordingPath(stream, kStart + 1000),
-             [&] { return strm->SetSettings(h, &shift); },
-             [&] { return strm->SetSettings(h, &shift); },
-             [&] { return strm->SetSettings(h, &live); }},
+            {rx->recordingPath(stream, kStart), rx->recordingPath(stream, kStart + 1000), shiftOn,
+             shiftOn, [&] { return strm->SetSettings(h, &live); }},
             {dump, other, [&] { return cfg->TSDumpStart(0, 0, 0, dump.c_str()); },
              [&] { return cfg->TSDumpStart(0, 0, 0, other.c_str()); },
              [&] { return cfg->TSDumpStop(); }},
@@ -382,19 +386,16 @@ TEST_F(ReceiverTest, FilesBeingMadeHoldOffASecondStartAndAStopAndAFullOneHoldsPl
         int fd = open(c.fifo.c_str(), O_RDONLY);
         starting.join();
         std::thread drain([fd] {
-            char b[4096];
-            while (read(fd, b, sizeof b) > 0) {
-            }
+            for (char b[4096]; read(fd, b, sizeof b) > 0;) continue;
         });
         EXPECT_EQ(std::make_tuple(first, c.stop()), std::make_tuple(kOk, kOk)) << c.fifo;
         drain.join();
         close(fd);
     }
     std::filesystem::create_symlink("/dev/full", rx->recordingPath(stream, kStart + 2000));
-    ASSERT_EQ(strm->SetSettings(h, &shift), kOk);
+    ASSERT_EQ(shiftOn(), kOk);
     advance(10000);
-    STRM_GetStatus st{};
-    strm->GetStatus(h, &st);
+    const STRM_GetStatus st = streamStatus(h);
     EXPECT_EQ(std::make_tuple(st.recduration, st.recsize, st.pbstate, st.pbposition),
               std::make_tuple(0, 0, kPvrTrick, 0));
 }
@@ -403,34 +404,84 @@ TEST_F(ReceiverTest, FilesBeingMadeHoldOffASecondStartAndAStopAndAFullOneHoldsPl
 // at yet (it is held meanwhile) leaves the time shift and the dump on that front end what they
 // received before it.
 TEST_F(ReceiverTest, RecordingsKeepTheirFileAndWhatTheyReceivedBeforeARetune) {
-    int32_t h;
+    int32_t h, same;  // same: a second stream of the service, whose file this second is h's
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
-    rx->recordDir = dir.path;
-    STRM_Settings shift{};
-    strm->GetSettings(h, &shift);
-    shift.playSpeed = shift.playSpeedDiv = 1;
+    const STRM_Settings shift = shifted(h, 1);
     const std::string dump = dir / "dump.ts";
     ASSERT_EQ(strm->SetSettings(h, &shift) | cfg->TSDumpStart(0, 0, 0, dump.c_str()), kOk);
-    int32_t same;  // a second stream of the service, in the same second: its file would be h's
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &same), kOk);
     EXPECT_EQ(strm->SetSettings(same, &shift), kErrBusy);
     std::promise<void> go;
-    std::shared_future<void> held = go.get_future().share();
-    rx->post([held] { held.wait(); });
+    rx->post([held = go.get_future().share()] { held.wait(); });
     rx->clock().advance(5000);
-    P other = sat(11493750, 0);
+    const P other = sat(11493750, 0);
     ASSERT_EQ(cfg->Tune(0, &other), kOk);
     go.set_value();
     rx->sync();
-    STRM_GetStatus st{};
-    strm->GetStatus(h, &st);
     EXPECT_EQ(cfg->TSDumpStop(), kOk);
-    EXPECT_GT(st.recsize, 0);
+    EXPECT_GT(streamStatus(h).recsize, 0);
     EXPECT_GT(std::filesystem::file_size(dump), 0u);
 }
 
-TEST_F(ReceiverTest, BadInputGetsItsResult) {
+// A service of a cable multiplex of the built-in broadcast: time shift records it and plays it
+// back, the dump takes the multiplex; ffprobe reads both files as the model says.
+TEST_F(ReceiverTest, TimeShiftRecordsTheServiceAndADumpTheTransponder) {
+    start(dvbmodel::builtinBroadcast(kStart / 1000));
+    const dvbmodel::Transport* tp = &rx->broadcast().networks[2].transports[1];  // 466 MHz
+    const dvbmodel::Service& svc = tp->services[0];
     int32_t h;
+    ASSERT_EQ(startStream(cable(466000, 4), svc.id, &h), kOk);  // QAM64
+    EXPECT_EQ(cfg->TSDumpStart(0, 0, 0, (dir / "missing/dump.ts").c_str()), kErrPath);
+    ASSERT_EQ(cfg->TSDumpStart(0, 0, 0, (dir / "dump.ts").c_str()), kOk);
+    EXPECT_EQ(cfg->TSDumpStart(0, 0, 0, (dir / "other.ts").c_str()), kErrBusy);
+    advance(1000);
+    const STRM_Settings s = shifted(h, 0);  // paused at 0: recording
+    rx->recordDir = dir / "missing";
+    EXPECT_EQ(strm->SetSettings(h, &s), kErrPath);
+    rx->recordDir = dir.path;
+    ASSERT_EQ(strm->SetSettings(h, &s), kOk);
+    advance(2500);
+    const STRM_GetStatus st = streamStatus(h);
+    // rec-<onid>-<tsid>-<service>-<UTC seconds of its start>.ts
+    const std::string file = dir / "rec-61441-2-513-1709323201.ts";
+    EXPECT_EQ(st.recduration, 2);
+    EXPECT_EQ(st.recsize, static_cast<int64_t>(std::filesystem::file_size(file)));
+    advance(500);
+    ASSERT_EQ(strm->Stop(h, 0) | cfg->TSDumpStop(), kOk);
+    EXPECT_GT(static_cast<int64_t>(std::filesystem::file_size(file)), st.recsize);  // to the stop
+
+    // The recording plays back through a stream opened on its path, its own service only.
+    STRM_OpenSettings back{};
+    snprintf(back.szPath, sizeof back.szPath, "%s", (dir / "missing.ts").c_str());
+    EXPECT_EQ(strm->Open(&back), kErrPath);
+    ASSERT_LT(file.size(), sizeof back.szPath);
+    snprintf(back.szPath, sizeof back.szPath, "%s", file.c_str());
+    int32_t p = strm->Open(&back);
+    STRM_Settings play{};
+    play.svcId = tp->services[1].id;
+    EXPECT_EQ(strm->Start(p, &play), kErrNoService);
+    play.svcId = svc.id;
+    ASSERT_EQ(strm->Start(p, &play), kOk);
+    advance(1500);
+    const STRM_GetStatus pb = streamStatus(p);
+    STRM_StreamInfo info{};
+    ASSERT_EQ(strm->CreatStreamInfo(p, &info), kOk);
+    auto count = [&svc](dvbmodel::Kind k) {
+        return std::count_if(svc.components.begin(), svc.components.end(),
+                             [k](const dvbmodel::Component& c) { return c.kind == k; });
+    };
+    EXPECT_EQ(std::make_tuple(pb.pbstate, pb.pbposition, info.videoCount, info.audioCount,
+                              info.subtitleCount),
+              std::make_tuple(int32_t{kPvrActive}, 1, count(dvbmodel::Kind::Video),
+                              count(dvbmodel::Kind::Audio), count(dvbmodel::Kind::Subtitle)));
+    EXPECT_EQ(strm->SetSettings(p, &s), kErrNotSupported);  // not recorded again
+    NEED_FFPROBE();
+    EXPECT_EQ(testdata::probe(file), testdata::expected(*tp, &svc));
+    EXPECT_EQ(testdata::probe(dir / "dump.ts"), testdata::expected(*tp));
+}
+
+TEST_F(ReceiverTest, BadInputGetsItsResult) {
+    int32_t h, n[4];  // n: a page's links
     ASSERT_EQ(startStream(sat(12551500, 1), 28006, &h), kOk);
     SCNM_OpenSettings scanOpen{0, 0};
     int32_t scan = scnm->Open(&scanOpen);
@@ -440,7 +491,6 @@ TEST_F(ReceiverTest, BadInputGetsItsResult) {
     SCNM_ServiceInfo* list = nullptr;
     SCNMNET_FrontEndSettings* nets = nullptr;
     uint8_t buf[8];
-    int32_t nav[4];
     uint32_t t;
     STRM_OpenSettings badOpen{};
     badOpen.frontend = 3;
@@ -448,40 +498,24 @@ TEST_F(ReceiverTest, BadInputGetsItsResult) {
     txt.pid = 0x206;
     int32_t tt = teltxt->Start(&txt);
     ASSERT_GT(tt, 0);
-    const struct {
-        const char* what;
-        std::function<int32_t()> op;
-        int32_t result;
-    } cases[] = {
-            {"scan used after close", [&] { return scnm->GetStatus(scan, &sst); }, kErrBadHandle},
-            {"scan list after close", [&] { return scnm->CreateServiceList(scan, &list); },
-             kErrBadHandle},
-            {"networks after close", [&] { return scnm->CreateNetworkList(scan, &nets); },
-             kErrBadHandle},
-            {"unknown stream", [&] { return strm->GetStatus(12345, &st); }, kErrBadHandle},
-            {"stream on no front end", [&] { return strm->Open(&badOpen); }, kErrBadParameter},
-            {"time of no stream", [&] { return strm->GetTime(-7, &t); }, kErrBadHandle},
-            {"negative count", [&] { return teltxt->GetData(tt, 0, -1, buf); }, kErrBadParameter},
-            {"page 99",
-             [&] { return teltxt->SetData(tt, 99, 0, &nav[0], &nav[1], &nav[2], &nav[3]); },
-             kErrBadParameter},
-            {"dump to no folder",
-             [&] { return cfg->TSDumpStart(0, 0, 0, "/nonexistent/dir/dump.ts"); }, kErrPath},
-            {"volume 101", [&] { return cfg->SetAudioVolume(101); }, kErrBadParameter},
-            {"subtitles of stream 2^31 + h",
-             [&] {
-                 SUBTTL_Settings sub{};
-                 sub.pid = 0x205, sub.hstrm = 0x80000000u | static_cast<uint32_t>(h);
-                 return subttl->Start(&sub);
-             },
-             kErrBadHandle},
+    constexpr int32_t kBad = kErrBadParameter, kGone = kErrBadHandle;  // gone: unknown or closed
+    const std::tuple<const char*, std::function<int32_t()>, int32_t> cases[] = {
+            {"scan used after close", [&] { return scnm->GetStatus(scan, &sst); }, kGone},
+            {"scan list after close", [&] { return scnm->CreateServiceList(scan, &list); }, kGone},
+            {"networks after close", [&] { return scnm->CreateNetworkList(scan, &nets); }, kGone},
+            {"unknown stream", [&] { return strm->GetStatus(12345, &st); }, kGone},
+            {"stream on no front end", [&] { return strm->Open(&badOpen); }, kBad},
+            {"time of no stream", [&] { return strm->GetTime(-7, &t); }, kGone},
+            {"negative count", [&] { return teltxt->GetData(tt, 0, -1, buf); }, kBad},
+            {"page 99", [&] { return teltxt->SetData(tt, 99, 0, n, n + 1, n + 2, n + 3); }, kBad},
+            {"volume 101", [&] { return cfg->SetAudioVolume(101); }, kBad},
+            {"subtitles, 2^31 + h", [&] { return startSubtitles(0x205, 0x80000000u | h); }, kGone},
             {"handles counted round to one open",
              [&] { return rx->nextHandle = tt, teltxt->Start(&txt); }, tt + 1},
-            {"stream closed", [&] { return strm->Close(h) | strm->GetStatus(h, &st); },
-             kErrBadHandle},
-            {"teletext ended with its stream", [&] { return teltxt->Stop(tt); }, kErrBadHandle},
+            {"stream closed", [&] { return strm->Close(h) | strm->GetStatus(h, &st); }, kGone},
+            {"teletext ended with its stream", [&] { return teltxt->Stop(tt); }, kGone},
     };
-    for (const auto& c : cases) EXPECT_EQ(c.op(), c.result) << c.what;
+    for (const auto& [what, op, result] : cases) EXPECT_EQ(op(), result) << what;
     EXPECT_EQ(sst.result, kErrBadHandle);
     EXPECT_TRUE(list == nullptr && nets == nullptr);
 }
@@ -587,9 +621,7 @@ protected:
         service = &rx->broadcast().networks[3].transports[0].services[0];
         EXPECT_EQ(startStream(terrestrial(506000), 0x0311, &stream), kOk);
         advance(1000);
-        SUBTTL_Settings sub{};
-        sub.pid = 0x105, sub.compositionPageId = sub.ancillaryPageId = 1, sub.hstrm = stream;
-        subHandle = subttl->Start(&sub);
+        subHandle = startSubtitles(0x105, stream);
         TELTXT_Settings txt{};
         txt.pid = 0x106;
         txtHandle = teltxt->Start(&txt);
@@ -617,10 +649,8 @@ TEST_F(DecodersTest, SubtitleBufferHoldsTheModelsDisplaySetWithTheStreamsPts) {
     auto* data = reinterpret_cast<SUBTTL_Data*>(bytes.data());
     ASSERT_EQ(subttl->GetData(subHandle, data), kOk);
     const dvbmodel::DisplaySet& set = service->subtitles[0];
-    STRM_GetStatus st{};
-    strm->GetStatus(stream, &st);
     // Shown at the loop's start, 1000 ms ago.
-    EXPECT_EQ(static_cast<uint32_t>(st.localPts - data->i_pts), 90000u);
+    EXPECT_EQ(static_cast<uint32_t>(streamStatus(stream).localPts - data->i_pts), 90000u);
     const SUBTTL_Page_t& page = data->page[0];
     const SUBTTL_Display& display = data->display;
     EXPECT_EQ(std::vector<int32_t>({data->numPage, page.i_id, page.i_timeout, page.i_state,
@@ -767,11 +797,7 @@ TEST_F(DecodersTest, NavigationFollowsTheLinksOrThePagesPresent) {
 // A file played back from mid-second shows each display set at its time from the stream's
 // start (not from the whole second before it).
 TEST_F(DecodersTest, PlaybackShowsDisplaySetsAtTheirTimesFromItsStart) {
-    testdata::TempDir dir;
-    rx->recordDir = dir.path;
-    STRM_Settings s{};
-    strm->GetSettings(stream, &s);
-    s.playSpeed = s.playSpeedDiv = 1;
+    const STRM_Settings s = shifted(stream, 1);
     ASSERT_EQ(strm->SetSettings(stream, &s), kOk);
     STRM_OpenSettings back{};
     snprintf(back.szPath, sizeof back.szPath, "%s",
@@ -781,15 +807,11 @@ TEST_F(DecodersTest, PlaybackShowsDisplaySetsAtTheirTimesFromItsStart) {
     int32_t p = strm->Open(&back);
     advance(700);
     ASSERT_EQ(strm->Start(p, &s), kOk);
-    SUBTTL_Settings sub{};
-    sub.pid = 0x105, sub.compositionPageId = sub.ancillaryPageId = 1, sub.hstrm = p;
-    int32_t h = subttl->Start(&sub);
+    int32_t h = startSubtitles(0x105, p);
     std::vector<uint8_t> data(sizeof(SUBTTL_Data));
     advance(rx->streams.at(p).service->subtitles.at(0).time);
     ASSERT_EQ(subttl->GetData(h, data.data()), kOk);
-    STRM_GetStatus st{};
-    strm->GetStatus(p, &st);
     // Sent just now: its PTS is the stream's.
-    EXPECT_EQ(reinterpret_cast<SUBTTL_Data*>(data.data())->i_pts, st.localPts);
+    EXPECT_EQ(reinterpret_cast<SUBTTL_Data*>(data.data())->i_pts, streamStatus(p).localPts);
 }
 }  // namespace
