@@ -309,9 +309,12 @@ void TsWriter::every(Send kind, uint16_t service, uint16_t item, int64_t period,
 void TsWriter::plan(int64_t from, int64_t to) {
     auto& due = st_.due_;
     due.clear();
+    // A recording of one service keeps what tells of it: its program, its name, its present
+    // and following events and the time.
     bool whole = opt_.only == nullptr;
     for (const auto& table : kTables) {
-        if (whole || table.kind == kPat || table.kind == kSdt)
+        if (whole || table.kind == kPat || table.kind == kSdt || table.kind == kEitPf ||
+            table.kind == kTdt || table.kind == kTot)
             every(table.kind, 0, 0, table.period, table.phase, from, to);
     }
     for (uint16_t si = 0; si < tp_.services.size(); ++si) {
@@ -777,7 +780,7 @@ void TsWriter::eitPf(bool actual, int64_t at) {
     for (const auto& tp : net_.transports) {
         if ((&tp == &tp_) != actual) continue;
         for (const auto& s : tp.services) {
-            if (s.events.empty()) continue;
+            if (s.events.empty() || !included(s)) continue;
             // Section 0 the present event, section 1 the following; empty where there is none.
             const Event* present = eventAt(s, seconds);
             const Event* following = eventAfter(s, seconds);

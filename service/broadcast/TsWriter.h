@@ -43,7 +43,8 @@ struct TsWriterStats {
 
 struct TsWriterOptions {
     // A recording of one service of the transport: its PIDs only, with a PAT, an SDT actual
-    // of that one program and its PMT; no other table. Null: the whole transport.
+    // of that one program, its PMT, its EIT present/following, the TDT and the TOT; no other
+    // table. Null: the whole transport.
     const Service* only = nullptr;
     // Bits per second of each video component's PES payload; at 2 Mbit/s an SD MPEG video
     // frame carries the writer's test card.

@@ -276,7 +276,7 @@ std::vector<std::array<int, 3>> Receiver::collectEvents(int64_t now) {
     }
     for (auto& [handle, stream] : streams) {
         if (!stream.started || stream.service == nullptr) continue;
-        const dvbmodel::Event* ev = dvbmodel::eventAt(*stream.service, now / 1000);
+        const dvbmodel::Event* ev = dvbmodel::eventAt(*stream.service, eventSeconds(stream, now));
         int32_t id = ev != nullptr ? ev->id : -1;
         if (id != stream.reportedEvent) {
             stream.reportedEvent = id;
@@ -285,6 +285,12 @@ std::vector<std::array<int, 3>> Receiver::collectEvents(int64_t now) {
     }
     collectDecoderEvents(now, out);
     return out;
+}
+
+int64_t Receiver::eventSeconds(const Stream& s, int64_t now) const {
+    if (!s.playback || s.playback->start == 0) return now / 1000;
+    int64_t pos = now - s.startedAt, loop = s.playback->loopMillis;
+    return s.playback->start + (loop > 0 ? pos % loop : pos) / 1000;
 }
 
 bool Receiver::decoding(const Stream& s, int64_t now, int64_t* from) const {

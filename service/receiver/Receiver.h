@@ -274,6 +274,10 @@ public:
     // Whether started stream `s` decodes its service at `now`: its front end locked on the
     // service's transponder and the CA module not blocking it; `*from` is when it began.
     bool decoding(const Stream& s, int64_t now, int64_t* from) const;
+    // The UTC second whose events stream `s` shows at `now` (ms): the clock's for a front end;
+    // for a file, when its capture was at that point of the loop, from the file's first
+    // TDT/TOT (the clock's where it has none), so that it shows the events it recorded.
+    int64_t eventSeconds(const Stream& s, int64_t now) const;
     // The 33-bit PTS of a stream decoding since `from`, at `ms`: 90 kHz from an origin of its
     // service's own.
     int64_t ptsAt(const Stream& s, int64_t from, int64_t ms) const;

@@ -62,6 +62,7 @@ int32_t ReceiverStrm::Open(const STRM_OpenSettings* settings) {
         playback = std::make_shared<dvbmodel::Broadcast>();
         playback->networks = std::move(capture.networks);
         playback->loopMillis = capture.durationMs;
+        playback->start = capture.firstUtc;
     }
     std::lock_guard<std::mutex> lock(mRx->mLock);
     if (mRx->streams.size() >= kMaxHandles) return kErrTooMany;
@@ -85,7 +86,6 @@ int32_t ReceiverStrm::startPlayback(Stream& s, const STRM_Settings& settings, in
                 s.started = true;
                 s.frozen = false;
                 s.startedAt = now;
-                s.playback->start = now / 1000;
                 s.network = &net;
                 s.transport = &tp;
                 s.service = &candidate;
@@ -391,7 +391,7 @@ int32_t ReceiverStrm::GetAllEvent(int32_t handle, EpgEvent* present, EpgEvent* f
     auto it = mRx->streams.find(handle);
     if (it == mRx->streams.end()) return kErrBadHandle;
     if (!it->second.started) return kErrNotStarted;
-    int64_t seconds = mRx->clock().nowSeconds();
+    int64_t seconds = mRx->eventSeconds(it->second, mRx->clock().nowMillis());
     const dvbmodel::Service& svc = *it->second.service;
     // EN 300 468 running status: 4 running, 1 not running.
     if (const auto* ev = dvbmodel::eventAt(svc, seconds)) fillEvent(*ev, 4, present, presentExt);
@@ -406,7 +406,8 @@ int32_t ReceiverStrm::GetEvent(int32_t handle, EpgEvent* event) {
     auto it = mRx->streams.find(handle);
     if (it == mRx->streams.end()) return kErrBadHandle;
     if (!it->second.started) return kErrNotStarted;
-    const auto* ev = dvbmodel::eventAt(*it->second.service, mRx->clock().nowSeconds());
+    const auto* ev = dvbmodel::eventAt(*it->second.service,
+                                       mRx->eventSeconds(it->second, mRx->clock().nowMillis()));
     if (ev == nullptr) return kErrNoData;
     fillEvent(*ev, 4, event, nullptr);
     return kOk;

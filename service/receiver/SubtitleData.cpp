@@ -75,8 +75,17 @@ void fillSubtitleData(const dvbmodel::DisplaySet& set, uint32_t pts, SUBTTL_Data
         to.i_object_defs = static_cast<int32_t>(objects);
         for (size_t o = 0; o < objects; ++o) {
             const dvbmodel::ObjectRef& ref = from.objects[o];
-            to.object_defs[o] = SUBTTL_ObjectDef{ref.id,         ref.type,       ref.x, ref.y,
-                                                 ref.foreground, ref.background, {},    0};
+            SUBTTL_ObjectDef& def = to.object_defs[o];
+            def = SUBTTL_ObjectDef{ref.id,         ref.type,       ref.x, ref.y,
+                                   ref.foreground, ref.background, {},    0};
+            // A character object's codes, two bytes each as broadcast (high byte first): the
+            // first 16 fit.
+            const size_t chars = std::min<size_t>(ref.text.size(), sizeof def.psz_text / 2);
+            for (size_t i = 0; i < chars; ++i) {
+                def.psz_text[2 * i] = static_cast<char>(ref.text[i] >> 8);
+                def.psz_text[2 * i + 1] = static_cast<char>(ref.text[i]);
+            }
+            def.i_text_length = static_cast<int32_t>(chars);
         }
     }
 

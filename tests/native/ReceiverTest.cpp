@@ -450,7 +450,9 @@ TEST_F(ReceiverTest, TimeShiftRecordsTheServiceAndADumpTheTransponder) {
     ASSERT_EQ(strm->Stop(h, 0) | cfg->TSDumpStop(), kOk);
     EXPECT_GT(static_cast<int64_t>(std::filesystem::file_size(file)), st.recsize);  // to the stop
 
-    // The recording plays back through a stream opened on its path, its own service only.
+    // The recording plays back through a stream opened on its path, its own service only, two
+    // days later with the events it recorded.
+    advance(2 * 86400000);
     STRM_OpenSettings back{};
     snprintf(back.szPath, sizeof back.szPath, "%s", (dir / "missing.ts").c_str());
     EXPECT_EQ(strm->Open(&back), kErrPath);
@@ -465,15 +467,20 @@ TEST_F(ReceiverTest, TimeShiftRecordsTheServiceAndADumpTheTransponder) {
     advance(1500);
     const STRM_GetStatus pb = streamStatus(p);
     STRM_StreamInfo info{};
-    ASSERT_EQ(strm->CreatStreamInfo(p, &info), kOk);
+    EpgEvent present{}, following{};
+    ExtEpgEvent ext[2];
+    ASSERT_EQ(strm->CreatStreamInfo(p, &info) |
+                      strm->GetAllEvent(p, &present, &following, &ext[0], &ext[1]),
+              kOk);
     auto count = [&svc](dvbmodel::Kind k) {
         return std::count_if(svc.components.begin(), svc.components.end(),
                              [k](const dvbmodel::Component& c) { return c.kind == k; });
     };
     EXPECT_EQ(std::make_tuple(pb.pbstate, pb.pbposition, info.videoCount, info.audioCount,
-                              info.subtitleCount),
+                              info.subtitleCount, present.evtId),
               std::make_tuple(int32_t{kPvrActive}, 1, count(dvbmodel::Kind::Video),
-                              count(dvbmodel::Kind::Audio), count(dvbmodel::Kind::Subtitle)));
+                              count(dvbmodel::Kind::Audio), count(dvbmodel::Kind::Subtitle),
+                              dvbmodel::eventAt(svc, kStart / 1000 + 2)->id));
     EXPECT_EQ(strm->SetSettings(p, &s), kErrNotSupported);  // not recorded again
     NEED_FFPROBE();
     EXPECT_EQ(testdata::probe(file), testdata::expected(*tp, &svc));
@@ -685,13 +692,16 @@ TEST(SubtitleData, StaysWithinTheBuffersRoom) {
     dvbmodel::DisplaySet set;
     dvbmodel::Region big;
     big.width = 700, big.height = 600, big.pixels.assign(700 * 600, 5), big.objects.resize(20);
+    big.objects[0].text.assign(17, 0x1234);  // a character object: 16 of its codes fit
     set.regions.assign(7, big), set.placements.resize(20), set.cluts.resize(6);
     std::vector<uint8_t> bytes(sizeof(SUBTTL_Data) + 64, 0xAA);
     auto* data = reinterpret_cast<SUBTTL_Data*>(bytes.data());
     fillSubtitleData(set, 7, data);
+    const SUBTTL_ObjectDef& chars = data->regions[4].object_defs[0];
     EXPECT_EQ(std::vector<int32_t>({data->numRegions, data->page[0].i_region_defs, data->numCluts,
-                                    data->regions[4].i_object_defs, data->regions[4].i_height}),
-              std::vector<int32_t>({5, 16, 4, 16, 384000 / 700}));
+                                    data->regions[4].i_object_defs, data->regions[4].i_height,
+                                    chars.i_text_length, chars.psz_text[30], chars.psz_text[31]}),
+              std::vector<int32_t>({5, 16, 4, 16, 384000 / 700, 16, 0x12, 0x34}));
     EXPECT_EQ(data->regions[4].p_pixbuf[548 * 700 - 1], 5);
     EXPECT_EQ(data->regions[4].p_pixbuf[548 * 700], 0xAA);
     EXPECT_EQ(std::count(bytes.end() - 64, bytes.end(), 0xAA), 64);
