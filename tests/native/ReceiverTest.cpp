@@ -700,8 +700,9 @@ TEST(SubtitleData, StaysWithinTheBuffersRoom) {
     const SUBTTL_ObjectDef& chars = data->regions[4].object_defs[0];
     EXPECT_EQ(std::vector<int32_t>({data->numRegions, data->page[0].i_region_defs, data->numCluts,
                                     data->regions[4].i_object_defs, data->regions[4].i_height,
-                                    chars.i_text_length, chars.psz_text[30], chars.psz_text[31]}),
-              std::vector<int32_t>({5, 16, 4, 16, 384000 / 700, 16, 0x12, 0x34}));
+                                    chars.i_text_length, chars.psz_text[30], chars.psz_text[31],
+                                    data->display.i_width, data->display.i_height}),
+              std::vector<int32_t>({5, 16, 4, 16, 384000 / 700, 16, 0x12, 0x34, 720, 576}));
     EXPECT_EQ(data->regions[4].p_pixbuf[548 * 700 - 1], 5);
     EXPECT_EQ(data->regions[4].p_pixbuf[548 * 700], 0xAA);
     EXPECT_EQ(std::count(bytes.end() - 64, bytes.end(), 0xAA), 64);
