@@ -263,6 +263,13 @@ TEST(DvbSubtitle, DamagedSegmentsAreDroppedAndCounted) {
         EXPECT_EQ(out[0].regions[1].pixels == s.regions[1].pixels, c.regionTwoDrawn);
         EXPECT_EQ(out[0].regions[0].pixels, s.regions[0].pixels);
     }
+    // A PES that lost its last packet is dropped, not handed on when the next PES starts.
+    std::vector<uint8_t> ts;
+    uint8_t cc = 0;
+    packetizePes(0x20, good, cc, ts), ts.resize(ts.size() - 188), packetizePes(0x20, good, cc, ts);
+    Packets got;
+    PesAssembler(0x20).feed(ts.data(), ts.size(), got);
+    EXPECT_TRUE(got == Packets{good}) << got.size() << " PES";
 }
 
 // One PSI section, CRC included, in one transport packet.
