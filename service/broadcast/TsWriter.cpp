@@ -630,7 +630,10 @@ void TsWriter::nit() {
             case Delivery::Terrestrial: {
                 dvbpsi_terr_deliv_sys_dr_t d{};
                 d.i_centre_frequency = tu.frequencyKHz * 100;  // in 10 Hz
-                d.i_bandwidth = tu.bandwidthKHz == 7000 ? 1 : tu.bandwidthKHz == 6000 ? 2 : 0;
+                d.i_bandwidth = tu.bandwidthKHz == 7000   ? 1
+                                : tu.bandwidthKHz == 6000 ? 2
+                                : tu.bandwidthKHz == 5000 ? 3
+                                                          : 0;
                 d.i_priority = 1;
                 d.i_time_slice_indicator = 1;  // not used
                 d.i_mpe_fec_indicator = 1;     // not used
