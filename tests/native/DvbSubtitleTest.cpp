@@ -212,6 +212,10 @@ TEST(DvbSubtitle, RoundTripThroughTheEncoder) {
     out = decode(decoder, {encodeDisplaySet(update, 3, 2)});
     ASSERT_EQ(out.size(), 1u);
     EXPECT_TRUE(flat(out[0]) == flat(update));
+    DisplaySet thin = s;  // an 8-bit region of no width, as damage makes: no pixel read or sent
+    thin.regions[2].width = 0, thin.regions[2].pixels.clear();
+    EXPECT_TRUE(flat(decode(decoder, {encodeDisplaySet(thin, 3, 3)}).at(0)) == flat(thin));
+    EXPECT_EQ(decoder.stats().runsClipped, 0u);
 }
 
 // Damage made on purpose, each from an encoded display set: what is sound stays.
