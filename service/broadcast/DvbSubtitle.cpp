@@ -703,7 +703,7 @@ void encodeField(std::vector<uint8_t>& out, const Region& r, int row) {
         // ffmpeg's 8-bit string reader stops at a full line before the string's end code and
         // then rejects the rest of the object: the last pixel of an 8-bit line goes as a 2-bit
         // string through the 2-to-8 map table, which every decoder reads alike.
-        const int last = bits == 8 ? r.width - 1 : r.width;
+        const int last = bits == 8 ? std::max(r.width - 1, 0) : r.width;  // width 0: no pixel
         for (int x = 0; x < last;) {
             uint32_t code = line[x] & mask;
             int end = x + 1;

@@ -111,7 +111,7 @@ void appendUtf8(std::string& out, char32_t c) {
 char32_t nextUtf8(std::string_view s, size_t& i) {
     uint8_t b = s[i++];
     if (b < 0x80) return b;
-    int n = b >= 0xF0 ? 3 : b >= 0xE0 ? 2 : b >= 0xC0 ? 1 : 0;
+    int n = b >= 0xF8 ? 0 : b >= 0xF0 ? 3 : b >= 0xE0 ? 2 : b >= 0xC0 ? 1 : 0;  // 0xF8.. lead none
     if (n == 0 || i + n > s.size()) return kBad;
     char32_t c = b & (0x3F >> n);
     for (int k = 0; k < n; ++k) {

@@ -45,6 +45,7 @@ void PesAssembler::feed(const uint8_t* ts, size_t size, std::vector<std::vector<
         size_t start = tsPayloadOffset(p);
         if (start > 188) continue;
         if (p[1] & 0x40) {
+            if (lost) pes_.clear();  // the PES before the gap lost its tail
             complete(out);
             pes_.assign(p + start, p + 188);
         } else if (lost) {

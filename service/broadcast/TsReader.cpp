@@ -868,9 +868,11 @@ struct VideoProbe {
         if (step == 0) return;
         const uint32_t milli = uint32_t((uint64_t{90000000} + step / 2) / step);
         component->frameRateMilli = milli;
+        uint32_t nearest = UINT32_MAX;  // 29.97 Hz is within half a percent of 30 Hz too
         for (uint32_t common : kMpegFrameRates) {
-            if (common != 0 && (milli > common ? milli - common : common - milli) * 200 <= common)
-                component->frameRateMilli = common;
+            const uint32_t off = milli > common ? milli - common : common - milli;
+            if (common != 0 && off * 200 <= common && off < nearest)
+                nearest = off, component->frameRateMilli = common;
         }
     }
 };

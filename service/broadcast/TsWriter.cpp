@@ -326,10 +326,11 @@ void TsWriter::plan(int64_t from, int64_t to) {
             const Component& c = s.components[ci];
             if (c.kind == Kind::Audio) every(kAudio, si, ci, kAudioFrameMs, 5 * ci % 24, from, to);
             if (c.kind != Kind::Video) continue;
-            // Frame k at UTC k * frame length exactly, in 90 kHz ticks.
+            // Frame k at UTC k * frame length exactly, in 90 kHz ticks: the ticks past the
+            // millisecond go in `index`, so that 29.97 Hz frames keep their 3003-tick steps.
             int64_t ticks = frameTicks(c);
             for (int64_t k = (from * 90 + ticks - 1) / ticks; k * ticks < to * 90; ++k)
-                due.push_back({k * ticks / 90, kVideo, si, ci, 0});
+                due.push_back({k * ticks / 90, kVideo, si, ci, uint32_t(k * ticks % 90)});
         }
         // Timed content: sent at start + n * loop + time, n = 0, 1, ... (once without a loop).
         int64_t start = b_.start * 1000, loop = b_.loopMillis;
@@ -390,7 +391,8 @@ void TsWriter::send(const TsWriterState::Due& d) {
             const Component& c = s->components[d.item];
             size_t bytes =
                     static_cast<size_t>(int64_t{opt_.videoBitRate} * frameTicks(c) / 90000 / 8);
-            return pes(c.pid, 0xE0, tsClockAt(d.at + kTsDecodeDelayMs), bytes, c);
+            return pes(c.pid, 0xE0, (tsClockAt(d.at + kTsDecodeDelayMs) + d.index) % kPtsWrap,
+                       bytes, c);
         }
         case kAudio: {
             const Component& c = s->components[d.item];
@@ -628,7 +630,10 @@ void TsWriter::nit() {
             case Delivery::Terrestrial: {
                 dvbpsi_terr_deliv_sys_dr_t d{};
                 d.i_centre_frequency = tu.frequencyKHz * 100;  // in 10 Hz
-                d.i_bandwidth = tu.bandwidthKHz == 7000 ? 1 : tu.bandwidthKHz == 6000 ? 2 : 0;
+                d.i_bandwidth = tu.bandwidthKHz == 7000   ? 1
+                                : tu.bandwidthKHz == 6000 ? 2
+                                : tu.bandwidthKHz == 5000 ? 3
+                                                          : 0;
                 d.i_priority = 1;
                 d.i_time_slice_indicator = 1;  // not used
                 d.i_mpe_fec_indicator = 1;     // not used

@@ -212,6 +212,10 @@ TEST(DvbSubtitle, RoundTripThroughTheEncoder) {
     out = decode(decoder, {encodeDisplaySet(update, 3, 2)});
     ASSERT_EQ(out.size(), 1u);
     EXPECT_TRUE(flat(out[0]) == flat(update));
+    DisplaySet thin = s;  // an 8-bit region of no width, as damage makes: no pixel read or sent
+    thin.regions[2].width = 0, thin.regions[2].pixels.clear();
+    EXPECT_TRUE(flat(decode(decoder, {encodeDisplaySet(thin, 3, 3)}).at(0)) == flat(thin));
+    EXPECT_EQ(decoder.stats().runsClipped, 0u);
 }
 
 // Damage made on purpose, each from an encoded display set: what is sound stays.
@@ -263,6 +267,13 @@ TEST(DvbSubtitle, DamagedSegmentsAreDroppedAndCounted) {
         EXPECT_EQ(out[0].regions[1].pixels == s.regions[1].pixels, c.regionTwoDrawn);
         EXPECT_EQ(out[0].regions[0].pixels, s.regions[0].pixels);
     }
+    // A PES that lost its last packet is dropped, not handed on when the next PES starts.
+    std::vector<uint8_t> ts;
+    uint8_t cc = 0;
+    packetizePes(0x20, good, cc, ts), ts.resize(ts.size() - 188), packetizePes(0x20, good, cc, ts);
+    Packets got;
+    PesAssembler(0x20).feed(ts.data(), ts.size(), got);
+    EXPECT_TRUE(got == Packets{good}) << got.size() << " PES";
 }
 
 // One PSI section, CRC included, in one transport packet.

@@ -51,7 +51,8 @@ TEST(DvbText, KeepsToItsRulesForDiacriticsControlsAndDamage) {
             {"13 d6d0 cec4 d641 d6", "中文A"},
             {"14 a4a4 a4e5", "中文"},
             {"12 c7d1 b1b9", "한국"},
-            {"15 41 ff 42 c0af 43 eda080 44 c3", "ABCD"},  // bad byte, overlong, surrogate, cut
+            {"15 41 ff 42 c0af 43 eda080 44 fc808080 c3",
+             "ABCD"},  // bad byte, overlong, surrogate, cut
     };
     for (const auto& [in, out] : cases) EXPECT_EQ(decodeText(unhex(in)), out) << in;
     for (auto in : {"11", "15", "10", "1000", "1f"}) EXPECT_EQ(decodeText(unhex(in)), "") << in;

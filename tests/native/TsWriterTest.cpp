@@ -70,6 +70,10 @@ TEST(TsWriter, EveryBuiltinTransportReadsBackToTheSameModelAndInFfprobe) {
     const bool ffprobe = std::system("ffprobe -version >/dev/null 2>&1") == 0;
     TempDir dir;
     Broadcast b = builtinBroadcast(kStart / 1000);
+    // What the built-in broadcast does not use: H.264 at 59.94 Hz (its frames fall between
+    // milliseconds), a multiplex of 5 MHz.
+    b.networks[0].transports[1].services[1].components[0].frameRateMilli = 59940;
+    b.networks[3].transports[2].tuning.bandwidthKHz = 5000;
     const int64_t midnight = kStart / 1000 / 86400 * 86400;
     size_t pages = 0;
     for (const Network& n : b.networks)
