@@ -216,10 +216,9 @@ JNIEXPORT jlongArray JNICALL Java_android_DVB_Spy_liveDvbs(JNIEnv* env, jclass) 
 // Strong references on the DVB object at `address`, not counting the one taken to ask; -1
 // when no such object lives.
 JNIEXPORT jint JNICALL Java_android_DVB_Spy_strongCount(JNIEnv*, jclass, jlong address) {
-    for (const auto& dvb : dvbsvc::liveDvbs()) {
+    for (const auto& dvb : dvbsvc::liveDvbs())
         if (static_cast<jlong>(reinterpret_cast<uintptr_t>(dvb.get())) == address)
             return dvb->getStrongCount() - 1;
-    }
     return -1;
 }
 
@@ -247,9 +246,8 @@ JNIEXPORT jintArray JNICALL Java_android_DVB_Spy_entryPoints(JNIEnv* env, jclass
     jint got[3] = {-99, -99, -99};
     JavaVM* vm = nullptr;
     env->GetJavaVM(&vm);
-    if (auto onLoad = reinterpret_cast<jint (*)(JavaVM*, void*)>(exported("JNI_OnLoad"))) {
+    if (auto onLoad = reinterpret_cast<jint (*)(JavaVM*, void*)>(exported("JNI_OnLoad")))
         got[0] = onLoad(vm, nullptr);
-    }
     const char* callbacks[] = {"_Z12StrmcallbackPvii", "_Z14SubttlcallbackPvii"};
     for (int i = 0; i < 2; ++i) {
         auto fn = reinterpret_cast<int (*)(void*, int, int)>(exported(callbacks[i]));

@@ -82,8 +82,7 @@ class CacheTest extends SpyTestBase {
     @ParameterizedTest
     @MethodSource("readers")
     void anIndexOutsideItsRoomTouchesNothing(Reader r) throws Throwable {
-        for (int p = 0; p < r.rooms.length; p++) {
-            for (int bad : new int[] {-1, r.rooms[p], Integer.MIN_VALUE}) {
+        for (int p = 0; p < r.rooms.length; p++) for (int bad : new int[] {-1, r.rooms[p], Integer.MIN_VALUE}) {
                 Object[] args = new Object[r.rooms.length + 1];
                 Arrays.fill(args, 0);
                 args[p] = bad;
@@ -92,7 +91,6 @@ class CacheTest extends SpyTestBase {
                         () -> call(module(dvb, r.cls), r.method, args));
                 assertEquals("Index " + bad + " out of bounds for length " + r.rooms[p], e.getMessage());
                 assertSameFields(r.layout.fill(r.layout.create(), 3), args[r.rooms.length]);
-            }
         }
         List<String> lines = new ArrayList<>();
         for (int i = 0; i < 3 * r.rooms.length; i++) lines.addAll(entryLines(r.cls, r.method));
@@ -173,8 +171,7 @@ class CacheTest extends SpyTestBase {
     @ParameterizedTest
     @ValueSource(ints = {0, 1, 3, 16, 20, -1})
     void aComponentQueryOverwritesOnlyItsCount(int count) throws Throwable {
-        byte[] older = components(1, 16);
-        byte[] newer = components(2, count);
+        byte[] older = components(1, 16), newer = components(2, count);
         Spy.setOut("Strm::CreatStreamInfo", 1, 0, older);
         dvb.getStrm().Strm_CreatStreamInfo(0, new Strm.STRM_StreamInfo());
         Spy.reset();
@@ -184,9 +181,7 @@ class CacheTest extends SpyTestBase {
         for (Reader l : LISTS) le(newer).putInt(l.from(0) - 4, Math.min(count, 16));
         STREAM_INFO.assertJava(newer, info, new Strm.STRM_StreamInfo());
         assertArrayEquals(Arrays.copyOfRange(newer, 1714, 1720), Spy.cacheEntry("caSysId", 0, 6));
-        for (Reader r : LISTS) {
-            for (int i = 0; i < 16; i++) r.assertEntry(dvb, i < count ? newer : older, i);
-        }
+        for (Reader r : LISTS) for (int i = 0; i < 16; i++) r.assertEntry(dvb, i < count ? newer : older, i);
         assertEquals(List.of("Strm::CreatStreamInfo"), ops(), "readers call nothing");
     }
 

@@ -47,8 +47,7 @@ class ContractTest extends SpyTestBase {
         return args;
     }
 
-    static final long H = HANDLE;
-    static final long L = LOW;
+    static final long H = HANDLE, L = LOW;
 
     static final Row[] ROWS = {
         // Tuning, positioner, output, device services: arguments at their widths.
@@ -131,9 +130,7 @@ class ContractTest extends SpyTestBase {
      */
     static byte[] scriptFor(Row r, Rec rec, int seed) {
         List<Layout> shaping = new ArrayList<>();
-        for (Object o : r.args) {
-            if (o instanceof Rec x && !x.in && x.arg == rec.arg) shaping.add(x.layout);
-        }
+        for (Object o : r.args) if (o instanceof Rec x && !x.in && x.arg == rec.arg) shaping.add(x.layout);
         byte[] p = rec.layout.pattern(seed + 31 * rec.arg, shaping);
         if (rec.layout == EXT_EVENT) le(p).putInt(0, 0);
         if (rec.layout == STREAM_INFO) {
@@ -150,9 +147,7 @@ class ContractTest extends SpyTestBase {
         Spy.setResult(r.op, result);
         Object[] javaArgs = r.args.clone();
         Object[] kept = new Object[r.args.length];
-        byte[][] sent = new byte[8][];
-        byte[][] scripted = new byte[8][];
-        byte[][] whole = new byte[8][]; // by operation argument
+        byte[][] sent = new byte[8][], scripted = new byte[8][], whole = new byte[8][]; // whole: by operation argument
         for (int i = 0; i < r.args.length; i++) {
             if (!(r.args[i] instanceof Rec rec)) continue;
             javaArgs[i] = rec.layout.fill(rec.layout.create(), seed + 100 * i);

@@ -103,9 +103,8 @@ class DvbTest extends SpyTestBase {
                 assertEquals(Arrays.asList(1, 2, 3, null), Arrays.asList(e[1], e[2], e[3], e[4]));
                 assertNotEquals(Thread.currentThread(), e[5], "delivered on the service's thread");
             }
-            assertEquals(3, got.stream().filter(e -> e[0] == dvb).count());
-            assertEquals(3, uncaught.size());
-            assertEquals("listener 2", uncaught.get(0).getMessage());
+            assertEquals(List.of(3L, 3, "listener 2"), List.of(got.stream().filter(e -> e[0] == dvb).count(),
+                    uncaught.size(), uncaught.get(0).getMessage()), "events to dvb, listener throws, first message");
 
             other.getCfg().Cfg_Stop(1);
             dvb.getCfg().Cfg_Stop(2);

@@ -232,9 +232,7 @@ class ReceiverEndToEndTest {
         } catch (IOException noFfmpeg) {
             return frames;
         }
-        for (File f : new TreeSet<>(List.of(dir.listFiles((d, name) -> name.endsWith(".png"))))) {
-            frames.add(ImageIO.read(f));
-        }
+        for (File f : new TreeSet<>(List.of(dir.listFiles((d, name) -> name.endsWith(".png"))))) frames.add(ImageIO.read(f));
         assertFalse(frames.isEmpty(), "ffmpeg rendered no frame");
         return frames;
     }
