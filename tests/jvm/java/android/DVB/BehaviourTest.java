@@ -62,9 +62,8 @@ class BehaviourTest extends SpyTestBase {
         assertEquals(0, dvb.getTeltxt().Teltxt_GetData(5, 3, 0, data));
         assertThrows(ArrayIndexOutOfBoundsException.class,
                 () -> dvb.getTeltxt().Teltxt_GetData(5, 4, 0, data));
-        IllegalArgumentException e = assertThrows(IllegalArgumentException.class,
-                () -> dvb.getTeltxt().Teltxt_GetData(5, 0, -5, data));
-        assertEquals("count -5 is negative", e.getMessage());
+        assertEquals("count -5 is negative", assertThrows(IllegalArgumentException.class,
+                () -> dvb.getTeltxt().Teltxt_GetData(5, 0, -5, data)).getMessage());
         assertArrayEquals(bytes(1, 2, 3), data);
         assertEquals(0, Spy.callCount());
     }
@@ -74,10 +73,8 @@ class BehaviourTest extends SpyTestBase {
     void aStreamPathThatDoesNotFitIsRefused(int chars, int bytes) {
         Strm.STRM_OpenSettings o = new Strm.STRM_OpenSettings();
         o.szPath = chars == bytes ? ascii(chars) : "\u00e9".repeat(chars);
-        IllegalArgumentException e = assertThrows(IllegalArgumentException.class,
-                () -> dvb.getStrm().Strm_Open(o));
         assertEquals("STRM_OpenSettings.szPath is " + bytes + " bytes; at most 127 fit",
-                e.getMessage());
+                assertThrows(IllegalArgumentException.class, () -> dvb.getStrm().Strm_Open(o)).getMessage());
         assertEquals(0, Spy.callCount());
     }
 

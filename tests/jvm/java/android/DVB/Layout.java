@@ -78,9 +78,7 @@ final class Layout {
     static String text(int seed, int width, boolean mayOverflow) {
         int n = new int[] {0, 2, width, width + 3, 1}[Math.floorMod(seed, mayOverflow ? 5 : 3)];
         StringBuilder s = new StringBuilder();
-        for (int i = 0; i < n; i++) {
-            s.append((char) (i == 1 && seed % 2 == 0 && mayOverflow ? 0xE9 : 'a' + (seed + i) % 26));
-        }
+        for (int i = 0; i < n; i++) s.append((char) (i == 1 && seed % 2 == 0 && mayOverflow ? 0xE9 : 'a' + (seed + i) % 26));
         return s.toString();
     }
 
@@ -173,9 +171,7 @@ final class Layout {
             assertEquals(Arrays.deepToString(new Object[] {javaValue(s, record)}),
                     Arrays.deepToString(new Object[] {s.field.get(o)}), s.field.getName());
         }
-        for (Field f : cls.getFields()) {
-            if (!mapped.contains(f)) assertEquals(f.get(kept), f.get(o), "unmapped " + f.getName());
-        }
+        for (Field f : cls.getFields()) if (!mapped.contains(f)) assertEquals(f.get(kept), f.get(o), "unmapped " + f.getName());
     }
 
     static Object javaValue(Slot s, byte[] r) {

@@ -13,8 +13,7 @@ import org.junit.jupiter.api.BeforeEach;
 /** Common ground of the JVM tests: a fresh spy, log and bound DVB object for every test. */
 abstract class SpyTestBase {
     /** High half set and low half negative: only the low half may reach a module. */
-    static final long HANDLE = 0x7654321089ABCDEFL;
-    static final long LOW = (int) HANDLE;
+    static final long HANDLE = 0x7654321089ABCDEFL, LOW = (int) HANDLE;
     static final String GETTER = "2 SCNM getScnm was called";
     static final String NET_BEGIN = "2 SCNM +++android_dvb_Scnm_GetServiceList";
     static final boolean WIDE = System.getProperty("sun.arch.data.model").equals("64");
