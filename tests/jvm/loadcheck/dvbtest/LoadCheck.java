@@ -76,9 +76,7 @@ public final class LoadCheck {
             for (Method m : cls.getDeclaredMethods()) {
                 List<Class<?>> types = Arrays.asList(m.getParameterTypes());
                 if (!Modifier.isNative(m.getModifiers())
-                        || types.stream().noneMatch(t -> t.getName().startsWith("android.DVB."))) {
-                    continue;
-                }
+                        || types.stream().noneMatch(t -> t.getName().startsWith("android.DVB."))) continue;
                 Object[] values = new Object[types.size()];
                 for (int i = 0; i < values.length; i++) {
                     Class<?> t = types.get(i);

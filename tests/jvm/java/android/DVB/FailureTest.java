@@ -90,21 +90,19 @@ class FailureTest extends SpyTestBase {
 
     @Test
     void aNullStringInARecordIsNamedWithItsField() throws Throwable {
-        for (ContractTest.Row r : ContractTest.ROWS) {
-            for (int i = 0; i < r.args().length; i++) {
-                if (!(r.args()[i] instanceof ContractTest.Rec rec) || !rec.in()) continue;
-                for (Layout.Slot s : rec.layout().slots) {
-                    if (s.field() == null || s.field().getType() != String.class || s.kind().equals("eng")) continue;
-                    Object[] values = r.args().clone();
-                    for (int k = 0; k < values.length; k++) {
-                        if (values[k] instanceof ContractTest.Rec x) values[k] = x.layout().fill(x.layout().create(), 1);
-                    }
-                    s.field().set(values[i], null);
-                    Throwable e = assertThrows(NullPointerException.class,
-                            () -> call(module(dvb, r.cls()), r.method(), values), r.method());
-                    assertEquals(rec.layout().cls.getSimpleName() + "." + s.field().getName() + " is null",
-                            e.getMessage());
+        for (ContractTest.Row r : ContractTest.ROWS) for (int i = 0; i < r.args().length; i++) {
+            if (!(r.args()[i] instanceof ContractTest.Rec rec) || !rec.in()) continue;
+            for (Layout.Slot s : rec.layout().slots) {
+                if (s.field() == null || s.field().getType() != String.class || s.kind().equals("eng")) continue;
+                Object[] values = r.args().clone();
+                for (int k = 0; k < values.length; k++) {
+                    if (values[k] instanceof ContractTest.Rec x) values[k] = x.layout().fill(x.layout().create(), 1);
                 }
+                s.field().set(values[i], null);
+                Throwable e = assertThrows(NullPointerException.class,
+                        () -> call(module(dvb, r.cls()), r.method(), values), r.method());
+                assertEquals(rec.layout().cls.getSimpleName() + "." + s.field().getName() + " is null",
+                        e.getMessage());
             }
         }
         assertEquals(0, Spy.callCount());

@@ -61,13 +61,11 @@ final class EndToEnd {
      */
     static int differing(BufferedImage a, BufferedImage b) {
         int differ = 0, shown = 0;
-        for (int y = 0; y < a.getHeight(); y++) {
-            for (int x = 0; x < a.getWidth(); x++) {
-                int p = a.getRGB(x, y), q = b.getRGB(x, y);
-                if ((p >>> 24) == 0 && (q >>> 24) == 0) continue;
-                shown++;
-                if (IntStream.of(0, 8, 16, 24).anyMatch(s -> Math.abs((p >>> s & 0xFF) - (q >>> s & 0xFF)) > 1)) differ++;
-            }
+        for (int y = 0; y < a.getHeight(); y++) for (int x = 0; x < a.getWidth(); x++) {
+            int p = a.getRGB(x, y), q = b.getRGB(x, y);
+            if ((p >>> 24) == 0 && (q >>> 24) == 0) continue;
+            shown++;
+            if (IntStream.of(0, 8, 16, 24).anyMatch(s -> Math.abs((p >>> s & 0xFF) - (q >>> s & 0xFF)) > 1)) differ++;
         }
         return shown == 0 ? -1 : differ;
     }
