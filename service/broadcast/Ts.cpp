@@ -44,12 +44,10 @@ void PesAssembler::feed(const uint8_t* ts, size_t size, std::vector<std::vector<
         continuity_ = cc;
         size_t start = tsPayloadOffset(p);
         if (start > 188) continue;
+        if (lost) pes_.clear();  // what was assembled before the gap is incomplete
         if (p[1] & 0x40) {
-            if (lost) pes_.clear();  // the PES before the gap lost its tail
             complete(out);
             pes_.assign(p + start, p + 188);
-        } else if (lost) {
-            pes_.clear();
         } else if (!pes_.empty()) {
             pes_.insert(pes_.end(), p + start, p + 188);
         }

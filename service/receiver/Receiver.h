@@ -169,11 +169,9 @@ struct Outputs {
     int32_t wakeup = 0;
     bool blindScan = false;
     int32_t blindScanDev = 0;
-    bool dumping = false;
     bool dumpOpening = false;  // a start is making its file, outside the lock
-    std::string dumpPath;
     int32_t dumpFrontend = 0;
-    std::shared_ptr<Recording> dump;
+    std::shared_ptr<Recording> dump;  // null: no dump
 };
 
 // Finishes a recording as it goes out of scope: declared before the receiver's lock is taken,

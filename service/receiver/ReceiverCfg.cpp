@@ -248,7 +248,7 @@ int32_t ReceiverCfg::TSDumpStart(int32_t dev, int32_t, int32_t, const char* path
         if (!mRx->validFrontend(dev)) return kErrBadParameter;
         if (path == nullptr || memchr(path, 0, kTSDumpPathSize) == nullptr || path[0] == '\0')
             return kErrPath;
-        if (mRx->outputs.dumping || mRx->outputs.dumpOpening) return kErrBusy;
+        if (mRx->outputs.dump || mRx->outputs.dumpOpening) return kErrBusy;
         if (!mRx->frontends[dev].tuned) return kErrNotStarted;
         // Held while the file is made outside the lock: a second start meanwhile is busy and
         // never creates or truncates a file of its own.
@@ -259,8 +259,6 @@ int32_t ReceiverCfg::TSDumpStart(int32_t dev, int32_t, int32_t, const char* path
     std::lock_guard<std::mutex> lock(mRx->mLock);
     mRx->outputs.dumpOpening = false;
     if (dump == nullptr) return kErrPath;
-    mRx->outputs.dumping = true;
-    mRx->outputs.dumpPath = path;
     mRx->outputs.dumpFrontend = dev;
     mRx->outputs.dump = std::move(dump);
     return kOk;
@@ -272,12 +270,10 @@ int32_t ReceiverCfg::TSDumpStop() {
     // A dump still making its file has not started yet: stopping it now is busy, not "not
     // started", so that a caller may try again.
     if (mRx->outputs.dumpOpening) return kErrBusy;
-    if (!mRx->outputs.dumping) return kErrNotStarted;
-    mRx->outputs.dumping = false;
+    if (!mRx->outputs.dump) return kErrNotStarted;
     // The file gets the packets up to now and is closed once the lock is released.
     mRx->planDump(mRx->clock().nowMillis());
     stop.recording = std::move(mRx->outputs.dump);
-    mRx->outputs.dump.reset();
     return kOk;
 }
 

@@ -231,8 +231,7 @@ int32_t ReceiverStrm::SetSettings(int32_t handle, const STRM_Settings* settings)
     }
     if (recording == nullptr) return kErrPath;
     Stream& s = it->second;
-    s.shifting = true;
-    s.shiftSince = since;
+    s.shifting = true;  // from shiftSince, set when the file was reserved
     s.recording = std::move(recording);
     s.settings = *settings;
     shift(s, *settings, mRx->clock().nowMillis());
@@ -249,7 +248,6 @@ void ReceiverStrm::stopRecording(Stream& s, RecordingStop& stop) {
     if (!s.recording) return;
     mRx->planRecording(*s.recording, s, mRx->clock().nowMillis());
     stop.recording = std::move(s.recording);
-    s.recording.reset();
 }
 
 int32_t ReceiverStrm::GetStatus(int32_t handle, STRM_GetStatus* status) {
