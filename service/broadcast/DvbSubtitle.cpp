@@ -56,29 +56,6 @@ private:
     size_t pos_ = 0;
 };
 
-class BitWriter {
-public:
-    explicit BitWriter(std::vector<uint8_t>& out) : out_(out) {}
-    void put(uint32_t v, int count) {
-        while (count-- > 0) {
-            acc_ = static_cast<uint8_t>(acc_ << 1 | ((v >> count) & 1u));
-            if (++filled_ == 8) {
-                out_.push_back(acc_);
-                acc_ = 0;
-                filled_ = 0;
-            }
-        }
-    }
-    void align() {
-        if (filled_ != 0) put(0, 8 - filled_);
-    }
-
-private:
-    std::vector<uint8_t>& out_;
-    uint8_t acc_ = 0;
-    int filled_ = 0;
-};
-
 // Rounds num / den (den > 0) to the nearest integer, halves away from zero.
 int roundDiv(int64_t num, int64_t den) {
     return static_cast<int>(num >= 0 ? (num + den / 2) / den : -((-num + den / 2) / den));
@@ -88,6 +65,15 @@ int roundDiv(int64_t num, int64_t den) {
 // and 16.7 % are 6, 4, 3, 2 and 1 sixths), as 0..255.
 int level(int sixths) {
     return roundDiv(sixths * 255, 6);
+}
+
+// One colour in the Y/Cr/Cb/T form: BT.601 studio range (Y 16..235), rounded to the nearest.
+ClutEntry yccOf(int r, int g, int b, int t) {
+    const int y = 16 + roundDiv(65481LL * r + 128553LL * g + 24966LL * b, 255000);
+    const int cb = 128 + roundDiv(-37797LL * r - 74203LL * g + 112000LL * b, 255000);
+    const int cr = 128 + roundDiv(112000LL * r - 93786LL * g - 18214LL * b, 255000);
+    return {static_cast<uint8_t>(y), static_cast<uint8_t>(cr), static_cast<uint8_t>(cb),
+            static_cast<uint8_t>(t)};
 }
 
 constexpr ClutEntry kTransparent{0, 128, 128, 255};
@@ -144,14 +130,6 @@ int depthBits(uint8_t code) {
 }
 
 }  // namespace
-
-ClutEntry yccOf(int r, int g, int b, int t) {
-    const int y = 16 + roundDiv(65481LL * r + 128553LL * g + 24966LL * b, 255000);
-    const int cb = 128 + roundDiv(-37797LL * r - 74203LL * g + 112000LL * b, 255000);
-    const int cr = 128 + roundDiv(112000LL * r - 93786LL * g - 18214LL * b, 255000);
-    return {static_cast<uint8_t>(y), static_cast<uint8_t>(cr), static_cast<uint8_t>(cb),
-            static_cast<uint8_t>(t)};
-}
 
 const Clut& defaultClut() {
     static const Clut c = makeDefaultClut();

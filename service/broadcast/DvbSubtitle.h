@@ -35,9 +35,6 @@ struct DvbSubtitleStats {
 // transparent entries read Y 0, Cr 128, Cb 128, T 255.
 const Clut& defaultClut();
 
-// One colour in the Y/Cr/Cb/T form: BT.601 studio range (Y 16..235), rounded to the nearest.
-ClutEntry yccOf(int r, int g, int b, int t);
-
 // Decodes the PES packets of one subtitle PID for one composition page and its ancillary
 // page. Segments of other pages are skipped.
 //

@@ -9,6 +9,36 @@
 
 namespace dvbmodel {
 
+// PTS, DTS and PCR bases count 90 kHz ticks modulo 2^33 (about 26.5 hours).
+constexpr int64_t kPtsWrap = int64_t{1} << 33;
+
+// `pts` less `ref`, the shorter way round the wrap: negative when `pts` comes first.
+inline int64_t ptsDelta(uint64_t pts, uint64_t ref) {
+    int64_t d = static_cast<int64_t>((pts - ref) & (kPtsWrap - 1));
+    return d >= kPtsWrap / 2 ? d - kPtsWrap : d;
+}
+
+// MSB-first bits into a byte vector, as MPEG and DVB syntax writes them.
+class BitWriter {
+public:
+    explicit BitWriter(std::vector<uint8_t>& out) : out_(out) {}
+    void put(uint32_t value, int bits) {
+        for (int i = bits - 1; i >= 0; --i) {
+            acc_ = static_cast<uint8_t>(acc_ << 1 | (value >> i & 1));
+            if (++n_ == 8) out_.push_back(acc_), acc_ = 0, n_ = 0;
+        }
+    }
+    // Zero bits up to the next byte.
+    void align() {
+        if (n_ > 0) put(0, 8 - n_);
+    }
+
+private:
+    std::vector<uint8_t>& out_;
+    uint8_t acc_ = 0;
+    int n_ = 0;
+};
+
 // A PES header's 33-bit time stamp from its 5 bytes (marker bits not checked: a bit error in
 // one leaves the time), and the 5 bytes of `pts` as a PTS-only header writes them ('0010').
 uint64_t readPts(const uint8_t* five);

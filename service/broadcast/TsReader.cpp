@@ -59,7 +59,6 @@ namespace {
 
 constexpr size_t kPacket = 188;
 constexpr uint8_t kSync = 0x47;
-constexpr uint64_t kPts33 = uint64_t{1} << 33;
 
 // PIDs of the DVB service information.
 constexpr uint16_t kPidPat = 0x0000, kPidNit = 0x0010, kPidSdt = 0x0011, kPidEit = 0x0012,
@@ -700,7 +699,7 @@ void Reader::timing(const uint8_t* p, uint16_t pid, bool payload, bool start, si
                              uint64_t(p[9]) << 1 | p[10] >> 7;
         if (pcrPid_ < 0) pcrPid_ = pid, firstPcr_ = lastPcr_ = pcr;
         if (pid == pcrPid_) {
-            const uint64_t delta = (pcr - lastPcr_) & (kPts33 - 1);
+            const uint64_t delta = (pcr - lastPcr_) & (kPtsWrap - 1);
             // A step back, or over ten seconds, is a discontinuity: it adds nothing.
             if (delta < 90000 * 10) pcrSpan_ += delta;
             lastPcr_ = pcr;
@@ -721,8 +720,7 @@ void Reader::timing(const uint8_t* p, uint16_t pid, bool payload, bool start, si
     if (pid != ptsPid_) return;
     // Counted from the first PTS, either way round the wrap (frames come out of order), so that
     // a capture across the wrap lasts what it holds, not 26 hours.
-    int64_t at = int64_t((pts - firstPts_) & (kPts33 - 1));
-    if (at >= int64_t(kPts33 / 2)) at -= int64_t(kPts33);
+    int64_t at = ptsDelta(pts, firstPts_);
     minPts_ = std::min(minPts_, at), maxPts_ = std::max(maxPts_, at);
 }
 
@@ -821,7 +819,6 @@ void Reader::push(dvbpsi_t* h, uint16_t pid, const uint8_t* s, size_t n) {
     }
 }
 
-// Second pass: the PES of subtitle and teletext PIDs of the PMTs, decoded into the services.
 // What a video PID's PES starts say of its pictures: the frame rate and size of an MPEG video
 // sequence header where the stream has one, else the frame rate from the smallest step
 // between the decoding times (or presentation times, where a PES gives no decoding time) of
@@ -843,7 +840,7 @@ struct VideoProbe {
             !(pes[7] & 0x80))
             return;
         const uint64_t t = readPts(pes + ((pes[7] & 0xC0) == 0xC0 ? 14 : 9));
-        const uint64_t delta = (t - last) & (kPts33 - 1);
+        const uint64_t delta = (t - last) & (kPtsWrap - 1);
         // A step of a second or more, or none, is a discontinuity or a repeated time.
         if (starts++ > 0 && delta > 0 && delta < 90000 && (step == 0 || delta < step)) step = delta;
         last = t;
@@ -877,15 +874,15 @@ struct VideoProbe {
     }
 };
 
+// Second pass: the PES of subtitle and teletext PIDs of the PMTs, decoded into the services,
+// and the video PIDs probed for their pictures.
 void Reader::timedContent(const uint8_t* d, size_t begin, size_t size) {
     // Times count from the capture's first PCR, else its first PTS.
     const bool haveRef = pcrPid_ >= 0 || ptsPid_ >= 0;
     const uint64_t ref = pcrPid_ >= 0 ? firstPcr_ : firstPts_;
     auto msOf = [&](uint64_t pts) -> int64_t {
         if (!haveRef) return 0;
-        int64_t delta = int64_t((pts - ref) & (kPts33 - 1));
-        if (delta >= int64_t(kPts33 / 2)) delta -= int64_t(kPts33);
-        return std::max<int64_t>(0, delta / 90);
+        return std::max<int64_t>(0, ptsDelta(pts, ref) / 90);
     };
     struct Stream {
         Stream(uint16_t p, Service* s) : pid(p), service(s), assembler(p) {}

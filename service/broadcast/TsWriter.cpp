@@ -28,7 +28,6 @@ namespace {
 
 constexpr uint16_t kPatPid = 0x0000, kNitPid = 0x0010, kSdtPid = 0x0011, kEitPid = 0x0012,
                    kTdtPid = 0x0014;
-constexpr int64_t kPtsWrap = int64_t{1} << 33;
 constexpr int64_t kAudioFrameMs = 24;
 // A silent MPEG-1 layer II frame: 192 kbit/s at 48 kHz is 576 bytes every 24 ms; with every
 // bit allocation zero the frame decodes to silence.
@@ -152,30 +151,12 @@ uint8_t* packetHeader(std::vector<uint8_t>& out, uint16_t pid, bool start, uint8
     return p + 4;
 }
 
-// MSB-first bits into a byte vector, for the picture below.
-class BitWriter {
-public:
-    explicit BitWriter(std::vector<uint8_t>& out) : out_(out) {}
-    void put(uint32_t value, int bits) {
-        for (int i = bits - 1; i >= 0; --i) {
-            acc_ = static_cast<uint8_t>(acc_ << 1 | (value >> i & 1));
-            if (++n_ == 8) out_.push_back(acc_), acc_ = 0, n_ = 0;
-        }
-    }
-    // Zero bits up to the next byte.
-    void align() {
-        if (n_ > 0) put(0, 8 - n_);
-    }
-    void start(uint8_t code) {
-        align();
-        out_.insert(out_.end(), {0x00, 0x00, 0x01, code});
-    }
-
-private:
-    std::vector<uint8_t>& out_;
-    uint8_t acc_ = 0;
-    int n_ = 0;
-};
+// A start code after zero bits up to the next byte.
+void startCode(BitWriter& w, uint8_t code) {
+    w.align();
+    for (uint8_t byte : {0x00, 0x00, 0x01}) w.put(byte, 8);
+    w.put(code, 8);
+}
 
 // An MPEG-2 intra picture (Main profile, 4:2:0, progressive) of flat 16x16 macroblocks, each
 // block coded by its DC alone: 75% colour bars over the top two thirds, a band in a colour of
@@ -192,19 +173,19 @@ void writeTestCard(std::vector<uint8_t>& out, uint16_t width, uint16_t height, u
     static constexpr uint8_t kChroma[9][2] = {{0, 2},  {1, 2},  {2, 2},   {6, 3},  {14, 4},
                                               {30, 5}, {62, 6}, {126, 7}, {254, 8}};
     BitWriter w(out);
-    w.start(0xB5);  // sequence extension: Main@Main, progressive, 4:2:0, low delay
+    startCode(w, 0xB5);  // sequence extension: Main@Main, progressive, 4:2:0, low delay
     w.put(0x1, 4), w.put(0x48, 8), w.put(1, 1), w.put(1, 2), w.put(0, 4), w.put(0, 12);
     w.put(1, 1), w.put(0, 8), w.put(1, 1), w.put(0, 7);
-    w.start(0xB8);  // GOP: time code 0 (its marker bit set), closed
+    startCode(w, 0xB8);  // GOP: time code 0 (its marker bit set), closed
     w.put(0, 12), w.put(1, 1), w.put(0, 12), w.put(1, 1), w.put(0, 1);
-    w.start(0x00);  // picture: temporal reference 0, intra, vbv_delay unknown
+    startCode(w, 0x00);  // picture: temporal reference 0, intra, vbv_delay unknown
     w.put(0, 10), w.put(1, 3), w.put(0xFFFF, 16), w.put(0, 1);
-    w.start(0xB5);  // picture coding extension: frame, DC precision 8 bits, progressive
+    startCode(w, 0xB5);  // picture coding extension: frame, DC precision 8 bits, progressive
     w.put(0x8, 4), w.put(0xFFFF, 16), w.put(0, 2), w.put(3, 2), w.put(0, 1), w.put(1, 1);
     w.put(0, 5), w.put(1, 1), w.put(1, 1), w.put(0, 1);
     const int columns = (width + 15) / 16, rows = (height + 15) / 16;
     for (int row = 0; row < rows; ++row) {
-        w.start(static_cast<uint8_t>(row + 1));
+        startCode(w, static_cast<uint8_t>(row + 1));
         w.put(8, 5), w.put(0, 1);  // quantiser scale (DC does not use it), no extra
         int predictor[3] = {128, 128, 128};
         for (int column = 0; column < columns; ++column) {
@@ -963,8 +944,8 @@ void TsWriter::pes(uint16_t pid, uint8_t streamId, uint64_t pts, size_t payload,
         auto card = std::find_if(st_.pictures_.begin(), st_.pictures_.end(),
                                  [pid](const auto& p) { return p.first == pid; });
         if (card == st_.pictures_.end() && h <= 2800) {
-            std::vector<uint8_t> bytes(14);
-            bytes.insert(bytes.end(), seq, seq + sizeof seq);
+            std::vector<uint8_t> bytes(14 + sizeof seq);
+            memcpy(bytes.data() + 14, seq, sizeof seq);
             writeTestCard(bytes, static_cast<uint16_t>(w), static_cast<uint16_t>(h), c.pid);
             st_.pictures_.emplace_back(pid, std::move(bytes));
             card = st_.pictures_.end() - 1;

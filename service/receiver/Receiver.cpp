@@ -1,5 +1,7 @@
 #include "Receiver.h"
 
+#include "broadcast/Ts.h"
+
 #include "broadcast/BroadcastSource.h"
 #include "broadcast/Builtin.h"
 
@@ -308,11 +310,10 @@ bool Receiver::decoding(const Stream& s, int64_t now, int64_t* from) const {
 }
 
 int64_t Receiver::ptsAt(const Stream& s, int64_t from, int64_t ms) const {
-    constexpr int64_t kPtsWrap = int64_t{1} << 33;
     uint32_t key = static_cast<uint32_t>(s.transport->tsid) << 16 | s.service->id;
-    int64_t pts = (mix(mClock.seed(), key, 3) + (ms - from) * 90) % kPtsWrap;
+    int64_t pts = (mix(mClock.seed(), key, 3) + (ms - from) * 90) % dvbmodel::kPtsWrap;
     // Before `from` (a display set sent before the stream began) the count runs backwards.
-    return pts < 0 ? pts + kPtsWrap : pts;
+    return pts < 0 ? pts + dvbmodel::kPtsWrap : pts;
 }
 
 std::string Receiver::recordingPath(const Stream& s, int64_t ms) const {
